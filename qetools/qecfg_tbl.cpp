@@ -1,0 +1,96 @@
+// Growable tables: named, zero-filled blocks to which items are only appended
+// and which are referred to by offsets, because a block moves when it grows.
+#include <cerrno>
+#include <cstdlib>
+
+#include "qecfg.h"
+
+void *qecfg_compiler::cfg_malloc(size_t s) {
+    void *p = std::calloc(1, s ? s : 1);
+    if (!p) {
+        int e = errno;
+        qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(e), nullptr, 0, e);
+    }
+    owned_blocks.push_back(p);
+    return p;
+}
+
+tbl *qecfg_compiler::new_tbl(const char *name, size_t au) {
+    owned_tbls.push_back(std::make_unique<tbl>());
+    tbl *t = owned_tbls.back().get();
+    t->tbl_au = au;
+    t->tbl_name = name;
+    return t;
+}
+
+// Makes sure the block holds at least `need` bytes, moving it if it must.
+static bool reserve_block(tbl *t, size_t need) {
+    if (need <= t->tbl_cap)
+        return true;
+    size_t cap = t->tbl_cap ? t->tbl_cap : need;
+    while (cap < need)
+        cap = cap < (size_t(1) << 62) ? cap * 2 : need;
+    char *nb = static_cast<char *>(std::realloc(t->tbl_base, cap));
+    if (!nb)
+        return false;
+    size_t used = t->tbl_next - t->tbl_base;
+    t->tbl_base = nb;
+    t->tbl_next = nb + used;
+    t->tbl_end = nb + t->tbl_size;
+    t->tbl_cap = cap;
+    return true;
+}
+
+void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
+    bool trace = opt.debugLevel > 2;
+    if (trace)
+        QECFG_TRACE(*this, "alloc_tble: %s, structure size: %d\n", t->tbl_name, int(s));
+    if (!t->tbl_base) {
+        t->tbl_size = 0;
+        if (!reserve_block(t, t->tbl_au)) {
+            int e = errno;
+            qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
+        }
+        t->tbl_size = t->tbl_au;
+        t->tbl_next = t->tbl_prev_base = t->tbl_base;
+        t->tbl_end = t->tbl_base + t->tbl_size;
+        std::memset(t->tbl_base, 0, t->tbl_size);
+        if (trace)
+            QECFG_TRACE(*this, "alloc_tble: %s, table size: %d\n", t->tbl_name, int(t->tbl_size));
+    }
+    if (s >= size_t(t->tbl_end - t->tbl_next)) {
+        // Grow by whole units, enough for the request alone; an exact fit grows too.
+        size_t incr = s == 0 ? t->tbl_au : t->tbl_au * ((s + t->tbl_au - 1) / t->tbl_au);
+        if (trace)
+            std::fprintf(opt.trace_err, "alloc_tble: overflow by %d b. Adding %d b to %s\n", int(s), int(incr),
+                         t->tbl_name);
+        char *old_base = t->tbl_base;
+        if (!reserve_block(t, t->tbl_size + incr)) {
+            int e = errno;
+            qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
+        }
+        t->tbl_prev_base = old_base;
+        t->tbl_size += incr;
+        t->tbl_end = t->tbl_base + t->tbl_size;
+        std::memset(t->tbl_next, 0, t->tbl_end - t->tbl_next);
+        if (trace)
+            QECFG_TRACE(*this, "alloc_tble: %s, new table size: %d\n", t->tbl_name, int(t->tbl_size));
+    }
+    char *item = t->tbl_next;
+    t->tbl_next += s;
+    return item;
+}
+
+void memcpy_8_rounded(void *dst, const void *src, size_t len) {
+    if (len == 0)
+        return;
+    std::memcpy(dst, src, len);
+    std::memset(static_cast<char *>(dst) + len, 0, round8(len) - len);
+}
+
+zu_uint32_t qecfg_compiler::save_tbl_val_round(tbl *tp, const void *val, size_t len) {
+    size_t rounded = round8(len);
+    char *p = static_cast<char *>(alloc_tble(tp, rounded));
+    memcpy_8_rounded(p, val, len);
+    return zu_uint32_t(p - tp->tbl_base);
+}
