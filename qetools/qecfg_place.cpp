@@ -34,15 +34,16 @@ int qecfg_compiler::place_scalar(value_slot out, const zu_value_t *in, zu_data_t
     if (given && !in && type != ZU_RSRC_HANDLE_PTR)
         return -1;
     switch (type) {
+    // Values are read by copy: a value field need only be 4-byte aligned.
     case ZU_INT32:
-    case ZU_UINT32: put_number<uint32_t>(out, type_out, given ? in->val_uint32 : 0); return 0;
+    case ZU_UINT32: put_number<uint32_t>(out, type_out, given ? load<uint32_t>(in) : 0); return 0;
     case ZU_INT64:
-    case ZU_UINT64: put_number<uint64_t>(out, type_out, given ? in->val_uint64 : 0); return 0;
-    case ZU_FLOAT32: put_number<float>(out, type_out, given ? in->val_float32 : 0.0f); return 0;
-    case ZU_FLOAT64: put_number<double>(out, type_out, given ? in->val_float64 : 0.0); return 0;
+    case ZU_UINT64: put_number<uint64_t>(out, type_out, given ? load<uint64_t>(in) : 0); return 0;
+    case ZU_FLOAT32: put_number<float>(out, type_out, given ? load<float>(in) : 0.0f); return 0;
+    case ZU_FLOAT64: put_number<double>(out, type_out, given ? load<double>(in) : 0.0); return 0;
     case ZU_CHAR_PTR:
         if (given) {
-            const char *text = in->ptr_char;
+            const char *text = load<const char *>(in);
             put_offset(out, add_to_tbl(st, text, std::strlen(text) + 1));
         } else if (is_default_code(type_out)) {
             put_offset(out, append_zero_body(st, 1));
@@ -52,10 +53,11 @@ int qecfg_compiler::place_scalar(value_slot out, const zu_value_t *in, zu_data_t
         return 0;
     case ZU_BINARY_PTR:
         if (given) {
-            uint32_t len = load<uint32_t>(in->ptr_binary);
+            const char *bin = load<const char *>(in);
+            uint32_t len = load<uint32_t>(bin);
             put_offset(out, add_to_tbl(st, &len, sizeof len));
             if (len)
-                add_to_tbl(st, reinterpret_cast<const char *>(in->ptr_binary) + offsetof(zu_binary_t, data), len);
+                add_to_tbl(st, bin + offsetof(zu_binary_t, data), len);
             else
                 append_zero_body(st, 1);
         } else if (is_default_code(type_out)) {
