@@ -1,0 +1,109 @@
+// Compiling a source given as a string in-process, with its traces, its
+// fatal message and its output file captured.
+#ifndef COMPILE_SUPPORT_H
+#define COMPILE_SUPPORT_H
+
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+
+#include "qecfg.h"
+
+struct compile_result {
+    int code = 0;        // 0, or the exit status of the fatal condition
+    std::string message; // the fatal message
+    std::string out;     // traces on standard output
+    std::string err;     // traces on standard error
+    std::string cdb;     // the output file, when there is one
+    bool has_output = false;
+};
+
+class captured_stream {
+  public:
+    captured_stream() : f_(open_memstream(&buf_, &len_)) {}
+    ~captured_stream() {
+        if (f_)
+            std::fclose(f_);
+        std::free(buf_);
+    }
+    FILE *file() { return f_; }
+    std::string text() {
+        std::fflush(f_);
+        return std::string(buf_, len_);
+    }
+
+  private:
+    char *buf_ = nullptr;
+    size_t len_ = 0;
+    FILE *f_;
+};
+
+// Compiles `source` to `<tmp>/<out_name>`; `setup` may change the options.
+template <typename F = void (*)(qecfg_options &)>
+compile_result compile_text(const std::string &source, F setup = [](qecfg_options &) {},
+                            const std::string &out_name = "out.cdef") {
+    namespace fs = std::filesystem;
+    static int serial = 0;
+    fs::path dir = fs::temp_directory_path() / ("qecfg-unit-" + std::to_string(getpid()) + "-" + std::to_string(serial++));
+    fs::create_directories(dir);
+    fs::path src = dir / "input.src", out = dir / out_name;
+    std::ofstream(src, std::ios::binary) << source;
+    captured_stream so, se;
+    qecfg_options opt;
+    opt.cdefsrc = src.string();
+    opt.cdefname = out.string();
+    opt.trace_out = so.file();
+    opt.trace_err = se.file();
+    setup(opt);
+    compile_result r;
+    setenv("ZU_CDB_FORCE_EMPTY_TIMESTAMP", "1", 1);
+    try {
+        qecfg_compiler c(opt);
+        c.run();
+    } catch (const qecfg_fatal &f) {
+        r.code = f.code;
+        r.message = f.message;
+    }
+    r.out = so.text();
+    r.err = se.text();
+    if (fs::exists(out)) {
+        std::ifstream in(out, std::ios::binary);
+        std::ostringstream s;
+        s << in.rdbuf();
+        r.cdb = s.str();
+        r.has_output = true;
+    }
+    fs::remove_all(dir);
+    return r;
+}
+
+// The fields of a little-endian image.
+inline uint32_t u32_at(const std::string &b, size_t off) {
+    uint32_t v = 0;
+    for (int i = 3; i >= 0; i--)
+        v = (v << 8) | uint8_t(b.at(off + i));
+    return v;
+}
+inline uint16_t u16_at(const std::string &b, size_t off) { return uint16_t(uint8_t(b.at(off)) | uint8_t(b.at(off + 1)) << 8); }
+
+// A class and a map, to which a test appends its stanzas (15 lines).
+inline const std::string BASE_SOURCE = "ControlDefinition\n"
+                                       "    FileVersion=1.0\n"
+                                       "ResourceClass\n"
+                                       "    Description=1\n"
+                                       "    DisplayName=2\n"
+                                       "    Properties=HasResources\n"
+                                       "    ClassPermTemplate=t\n"
+                                       "    ResourcePermTemplate=t\n"
+                                       "    Name=Test.Class\n"
+                                       "ClassToManagerMapping\n"
+                                       "    ResourceManager=Test.RM\n"
+                                       "    FirstKey=1\n"
+                                       "    LastKey=5\n"
+                                       "    MessageCatalog=test.cat\n"
+                                       "    DescriptiveMessageSet=1\n";
+
+#endif
