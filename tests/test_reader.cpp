@@ -1,0 +1,122 @@
+// The source reader: comments, quotes, trailing blanks, headers, and the
+// 254-character pieces that count as lines.
+#include <gtest/gtest.h>
+
+#include "compile_support.h"
+
+namespace {
+
+// With no variable class the class dsect is the first, at 80 + 3 * 16.
+constexpr size_t CLASS = 128;
+
+std::string class_string(const std::string &cdb, size_t ref_field) {
+    size_t strings = CLASS + u32_at(cdb, CLASS + 160);
+    return std::string(cdb.c_str() + strings + u32_at(cdb, CLASS + ref_field));
+}
+
+TEST(Reader, CommentAndBlankLinesAreIgnored) {
+    compile_result r = compile_text("  # note\n// note\n/* note\n\t\n  \"\"  \"\n" + BASE_SOURCE + "   /* trailing\n");
+    EXPECT_EQ(r.message, "");
+    EXPECT_TRUE(r.has_output);
+}
+
+TEST(Reader, CommentAfterValueIsCutAndTrailingBlanksRemoved) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("Description=1"), 13, "Description=12 # twelve");
+    src.replace(src.find("Name=Test.Class"), 15, "Name=\"a#b\"   ");
+    compile_result r = compile_text(src);
+    ASSERT_EQ(r.message, "");
+    EXPECT_EQ(u16_at(r.cdb, CLASS + 210), 12);
+    EXPECT_EQ(class_string(r.cdb, 8), "a#b");
+}
+
+TEST(Reader, SlashCommentsOutsideQuotesOnly) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("Name=Test.Class"), 15, "Name=\"x//y\" // the name");
+    compile_result r = compile_text(src);
+    ASSERT_EQ(r.message, "");
+    EXPECT_EQ(class_string(r.cdb, 8), "x//y");
+}
+
+TEST(Reader, HeaderFollowedByCommentIsRecognised) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("ResourceClass\n"), 14, "ResourceClass   # the class\n");
+    EXPECT_EQ(compile_text(src).message, "");
+}
+
+TEST(Reader, IndentedHeaderIsAStatement) {
+    EXPECT_EQ(compile_text(" ControlDefinition\n").message, "1: Attribute found but no table defined yet\n");
+    EXPECT_EQ(compile_text(BASE_SOURCE + " ControlDefinition\n").message, "16: Missing '=' after attribute name\n");
+}
+
+TEST(Reader, LongLineIsReadInPiecesCountedAsLines) {
+    // 20 + 280 = 300 characters: a piece of 254, then one of 46 in column 0.
+    compile_result r = compile_text("ClassToManagerMapping\n    ResourceManager=" + std::string(280, 'y') + "\n");
+    EXPECT_EQ(r.message, "3: Invalid table name: " + std::string(46, 'y') + "\n");
+}
+
+TEST(Reader, NewlineAfterTwoHundredFiftyFourCharactersIsAPieceOfItsOwn) {
+    auto with_name_line = [](size_t len) {
+        std::string src = BASE_SOURCE;
+        src.replace(src.find("    Name=Test.Class"), 19, "    Name=" + std::string(len - 9, 'n'));
+        return compile_text(src + "Bogus\n").message;
+    };
+    EXPECT_EQ(with_name_line(253), "16: Invalid table name: Bogus\n");
+    EXPECT_EQ(with_name_line(254), "17: Invalid table name: Bogus\n");
+}
+
+TEST(Reader, CarriageReturnStaysInTheValue) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("Name=Test.Class\n"), 16, "Name=Test.Class\r\n");
+    compile_result r = compile_text(src);
+    ASSERT_EQ(r.message, "");
+    EXPECT_EQ(class_string(r.cdb, 8), "Test.Class\r");
+}
+
+TEST(Reader, UnterminatedLastLineIsRead) {
+    std::string src = BASE_SOURCE.substr(0, BASE_SOURCE.size() - 1);
+    EXPECT_EQ(compile_text(src + "\nBogus").message, "16: Invalid table name: Bogus\n");
+}
+
+TEST(Reader, NulByteEndsTheLine) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("Name=Test.Class"), 15, std::string("Name=Te\0st", 10));
+    compile_result r = compile_text(src);
+    ASSERT_EQ(r.message, "");
+    EXPECT_EQ(class_string(r.cdb, 8), "Te");
+}
+
+TEST(Driver, MessagesWithoutNewlineUnderN) {
+    compile_result r = compile_text("Bogus\n", [](qecfg_options &o) { o.interactive = 0; });
+    EXPECT_EQ(r.message, "1: Invalid table name: Bogus");
+    EXPECT_EQ(r.code, 1);
+}
+
+TEST(Driver, StatementTracesAtLevelTwo) {
+    compile_result r = compile_text("ControlDefinition\n    FileVersion=2.1\n", [](qecfg_options &o) { o.debugLevel = 2; });
+    EXPECT_EQ(r.out, "ControlDefinition: found attr: \"FileVersion\", value: \"2.1\",length: 3\n"
+                     "Added 1 to mask, which is now 1\n");
+    EXPECT_EQ(r.message, "No class-to-manager maps defined\n");
+}
+
+TEST(Driver, OptionalStatementsAddNoMaskTrace) {
+    compile_result r = compile_text(BASE_SOURCE, [](qecfg_options &o) { o.debugLevel = 2; });
+    EXPECT_NE(r.out.find("ResourceClass: found attr: \"Name\", value: \"Test.Class\",length: 10\n"
+                         "ClassToManagerMapping"),
+              std::string::npos);
+}
+
+TEST(Driver, FailedCompileLeavesExistingOutputUntouched) {
+    namespace fs = std::filesystem;
+    fs::path out = fs::temp_directory_path() / ("qecfg-keep-" + std::to_string(getpid()) + ".cdef");
+    std::ofstream(out) << "old";
+    compile_result r = compile_text("Bogus\n", [&](qecfg_options &o) { o.cdefname = out.string(); });
+    EXPECT_EQ(r.code, 1);
+    std::ifstream in(out);
+    std::string s;
+    in >> s;
+    EXPECT_EQ(s, "old");
+    fs::remove(out);
+}
+
+} // namespace
