@@ -1,5 +1,6 @@
 // The source reader: one pass over the source in pieces of at most 254
 // characters, comment removal, stanza framing and dispatch of statements.
+#include <array>
 #include <cerrno>
 #include <vector>
 
@@ -10,36 +11,51 @@ namespace {
 constexpr size_t LINE_BUFFER = 256;
 constexpr size_t PIECE_MAX = 254; // what one read of LINE_BUFFER - 1 takes
 
-// Reads the pieces that fgets with a 255-byte size would return.
+// Hands out the pieces that fgets with a 255-byte size would return, each
+// NUL-terminated and writable. A piece that ends with its newline inside the
+// read buffer is handed out in place (the newline becomes its terminator,
+// which the comment scan would cut there anyway); others are copied.
 class piece_reader {
   public:
-    explicit piece_reader(FILE *fp) : fp_(fp), buf_(1 << 16) {}
+    explicit piece_reader(FILE *fp) : fp_(fp), buf_(BUFFER_SIZE + 1) {}
 
-    // Fills out (LINE_BUFFER bytes) with the next piece; false at the end of
-    // the input. A read error is reported through err.
-    bool next(char *out, int &err) {
+    // The next piece, or null at the end of the input; a read error is
+    // reported through err.
+    char *next(int &err) {
+        if (pos_ == len_ && !refill(err))
+            return nullptr;
+        char *start = buf_.data() + pos_;
+        size_t avail = std::min(len_ - pos_, PIECE_MAX);
+        if (char *nl = static_cast<char *>(std::memchr(start, '\n', avail))) {
+            *nl = '\0';
+            pos_ += size_t(nl - start) + 1;
+            return start;
+        }
         size_t n = 0;
         while (n < PIECE_MAX) {
             if (pos_ == len_ && !refill(err))
                 break;
-            const char *start = buf_.data() + pos_;
-            size_t avail = std::min(len_ - pos_, PIECE_MAX - n);
-            const void *nl = std::memchr(start, '\n', avail);
-            size_t take = nl ? size_t(static_cast<const char *>(nl) - start) + 1 : avail;
-            std::memcpy(out + n, start, take);
+            const char *from = buf_.data() + pos_;
+            size_t take = std::min(len_ - pos_, PIECE_MAX - n);
+            const void *nl = std::memchr(from, '\n', take);
+            if (nl)
+                take = size_t(static_cast<const char *>(nl) - from) + 1;
+            std::memcpy(line_ + n, from, take);
             n += take;
             pos_ += take;
             if (nl)
                 break;
         }
-        out[n] = '\0';
-        return n > 0 && err == 0;
+        line_[n] = '\0';
+        return n > 0 && err == 0 ? line_ : nullptr;
     }
 
   private:
+    static constexpr size_t BUFFER_SIZE = 1 << 16;
+
     bool refill(int &err) {
         pos_ = 0;
-        len_ = std::fread(buf_.data(), 1, buf_.size(), fp_);
+        len_ = std::fread(buf_.data(), 1, BUFFER_SIZE, fp_);
         if (len_ == 0 && std::ferror(fp_))
             err = errno ? errno : EIO;
         return len_ > 0;
@@ -48,52 +64,68 @@ class piece_reader {
     FILE *fp_;
     std::vector<char> buf_;
     size_t pos_ = 0, len_ = 0;
+    char line_[LINE_BUFFER];
 };
+
+// Character classes of the comment scan.
+enum char_class : unsigned char { ORDINARY, BLANK, NEWLINE, QUOTE, HASH, SLASH, END };
+
+constexpr std::array<unsigned char, 256> make_classes() {
+    std::array<unsigned char, 256> t{};
+    t[' '] = t['\t'] = BLANK;
+    t['\n'] = NEWLINE;
+    t['"'] = QUOTE;
+    t['#'] = HASH;
+    t['/'] = SLASH;
+    t['\0'] = END;
+    return t;
+}
+constexpr std::array<unsigned char, 256> char_classes = make_classes();
 
 // Cuts comments and the newline off a piece; false when nothing is left to
 // process (a comment line or a line of blanks, tabs and quotes).
 bool strip_comments(char *line) {
     int non_blank = 0, is_comment = 0, dbl_quote = 2;
-    for (char *p = line; *p; p++) {
-        char c = *p;
-        if (c == ' ' || c == '\t')
+    char *p = line;
+    for (;; p++) {
+        switch (char_classes[static_cast<unsigned char>(*p)]) {
+        case ORDINARY:
+            // Runs of ordinary text are skipped at the speed of strcspn.
+            non_blank = 1;
+            p += std::strcspn(p, " \t\n\"#/") - 1;
             continue;
-        if (c == '\n') {
-            *p = '\0';
-            break;
-        }
-        if (c == '"') {
-            dbl_quote++;
-            continue;
-        }
-        bool in_quotes = dbl_quote % 2 == 1;
-        if (c == '#') {
+        case BLANK: continue;
+        case QUOTE: dbl_quote++; continue;
+        case HASH:
             if (non_blank == 0) {
-                is_comment++;
+                is_comment = 1;
                 break;
             }
-            if (!in_quotes) {
+            if (dbl_quote % 2 == 0) {
                 *p = '\0';
                 break;
             }
-            non_blank++;
             continue;
-        }
-        if (c == '/' && (p[1] == '/' || p[1] == '*')) {
-            if (in_quotes)
+        case SLASH:
+            if (p[1] != '/' && p[1] != '*') {
+                non_blank = 1;
+                continue;
+            }
+            if (dbl_quote % 2 == 1)
                 continue;
             if (non_blank == 0)
-                is_comment++;
+                is_comment = 1;
             *p = '\0';
             break;
+        case NEWLINE: *p = '\0'; break;
+        default: break; // the end of the piece
         }
-        non_blank++;
+        break;
     }
     if (is_comment || non_blank == 0)
         return false;
-    size_t n = std::strlen(line);
-    while (n > 0 && (line[n - 1] == ' ' || line[n - 1] == '\t' || line[n - 1] == '#'))
-        line[--n] = '\0';
+    while (p > line && (p[-1] == ' ' || p[-1] == '\t' || p[-1] == '#'))
+        *--p = '\0';
     return true;
 }
 
@@ -101,7 +133,7 @@ bool strip_comments(char *line) {
 
 int qecfg_compiler::set_table_id(const char *name) const {
     for (int i = 0; sc_tables[i].sc_name; i++)
-        if (std::strcmp(sc_tables[i].sc_name, name) == 0)
+        if (sc_tables[i].sc_name[0] == name[0] && std::strcmp(sc_tables[i].sc_name, name) == 0)
             return i;
     return -1;
 }
@@ -137,10 +169,9 @@ void qecfg_compiler::cache_input_data(const char *filename) {
         qecfg_error_exit_rtn(filename, ": cannot open because: ", std::strerror(e), 0, e);
     }
     piece_reader reader(cdb_fp);
-    char line[LINE_BUFFER];
     int table_id = -1;
     int err = 0;
-    while (reader.next(line, err)) {
+    while (char *line = reader.next(err)) {
         linenum++;
         if (!strip_comments(line))
             continue;

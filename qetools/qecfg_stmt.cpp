@@ -62,7 +62,7 @@ void qecfg_compiler::save_attr(char *il, int table_id) {
         statement_error("Attibute value exceeds maximum length: ", name);
     const table_attrs *row = nullptr;
     for (int i = 0; i < e->sc_num_attrs_in_table && !row; i++)
-        if (std::strcmp(e->sc_attrs[i].ta_name, name) == 0)
+        if (e->sc_attrs[i].ta_name[0] == name[0] && std::strcmp(e->sc_attrs[i].ta_name, name) == 0)
             row = &e->sc_attrs[i];
     if (!row)
         statement_error("Attribute name not defined in table (name/table): ", name, e->sc_name);

@@ -1,0 +1,203 @@
+// Benchmark of the compiler at scale: generates valid sources of chosen sizes
+// (many classes with attributes of every data type and their values,
+// actions, structured data and variable classes), compiles each with the
+// qecfg binary, and reports wall time, throughput, peak memory and the ratio
+// of the compile time to the floor: reading the same file once in pieces of
+// at most 254 characters, touching every byte.
+//
+//   qecfg_bench [--qecfg PATH] [--dir DIR] [--runs N] SIZE_MB...
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <vector>
+
+namespace {
+
+using clock_type = std::chrono::steady_clock;
+
+constexpr int ATTRS_PER_CLASS = 6000; // well below the 65535 records a table may hold
+
+const char *const SCALAR_VALUES[][2] = {
+    {"Int32", "-123456"},       {"UInt32", "4000000000"}, {"Int64", "-9000000000"},
+    {"UInt64", "18000000000"},  {"Float32", "1.5e3"},     {"Float64", "0x1p-3"},
+    {"String", "\"some text\""}, {"Binary", "0x00ff10aa"}, {"Int32Array", "7"},
+    {"StringArray", "elem"},    {"BinaryArray", "ab\\101"}, {"RH", nullptr},
+};
+
+struct generator {
+    FILE *f;
+    int cls = 0, attr = 0;
+
+    void element(const char *kind, const char *name, int idx, const char *type) {
+        std::fprintf(f, "%s\n    ElementName=%s\n    Description=1\n    DisplayName=2\n    ElementIndex=%d\n    DataType=%s\n",
+                     kind, name, idx, type);
+    }
+
+    void start_class() {
+        std::fprintf(f, "ControlDefinition\n    FileVersion=1.0.%d\nResourceClass\n    Description=1\n    DisplayName=2\n"
+                        "    Properties=HasResources,CanDefine\n    ClassPermTemplate=t\n    ResourcePermTemplate=t\n"
+                        "    Name=Bench.Class%d\n",
+                     cls, cls);
+        element("DefineSDDefinition", "Input", 0, "String");
+        element("DefineSDDefinition", "Size", 1, "UInt64");
+        std::fprintf(f, "ResourceAction\n    Name=Act%d\n    Description=1\n    DisplayName=2\n    Id=1\n    VarietyRange=1,1\n"
+                        "    Permission=x\n",
+                     cls);
+        element("ActionInSDDefinition", "Arg", 0, "Int32");
+        cls++;
+        attr = 0;
+    }
+
+    void persistent(int i) {
+        const char *const *tv = SCALAR_VALUES[i % (sizeof SCALAR_VALUES / sizeof SCALAR_VALUES[0])];
+        std::fprintf(f, "PersistentResourceAttribute\n    Name=Attr%d\n    Description=%d\n    DisplayName=%d\n    Id=%d\n"
+                        "    DataType=%s\n    VarietyRange=1,1\n    Properties=Public,ReqdForDefine\n",
+                     i, i & 0x7fff, i & 0x7fff, i, tv[0]);
+        if (tv[1]) {
+            std::fprintf(f, "    ValidValue=%s\n    ValueDisplayName=3\n", tv[1]);
+            std::fprintf(f, "    DefaultValue=%s\n", tv[1]);
+        }
+    }
+
+    void dynamic(int i) {
+        std::fprintf(f, "DynamicResourceAttribute\n    Name=Dyn%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
+                        "    DataType=Float64\n    VariableType=Quantity\n    VarietyRange=1,1\n    VariableClass=VC%d\n"
+                        "    Range=0,1000\n    InitialValue=1.25\n",
+                     i, i, i % 4);
+    }
+
+    void structured(int i) {
+        std::fprintf(f, "PersistentClassAttribute\n    Name=Sd%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
+                        "    DataType=SD\n    VarietyRange=1,1\n",
+                     i, i);
+        element("PAttrSDDefinition", "A", 0, "Int32");
+        element("PAttrSDDefinition", "B", 1, "String");
+    }
+
+    void stanza() {
+        if (cls == 0 || attr >= ATTRS_PER_CLASS)
+            start_class();
+        int i = attr++;
+        switch (i % 8) {
+        case 6: dynamic(i); break;
+        case 7: structured(i); break;
+        default: persistent(i); break;
+        }
+    }
+
+    void finish() {
+        std::fprintf(f, "ClassToManagerMapping\n    ResourceManager=Bench.RM\n    FirstKey=1\n    LastKey=100\n"
+                        "    MessageCatalog=bench.cat\n    DescriptiveMessageSet=1\n");
+        for (int v = 0; v < 4; v++)
+            std::fprintf(f, "ResourceVariableClass\n    VariableClass=VC%d\n    ObservationInterval=60\n"
+                            "    ReportingInterval=60\n",
+                         v);
+    }
+};
+
+void generate(const std::string &path, size_t bytes) {
+    FILE *f = std::fopen(path.c_str(), "w");
+    if (!f) {
+        std::perror(path.c_str());
+        std::exit(2);
+    }
+    generator g{f};
+    while (size_t(std::ftell(f)) < bytes)
+        g.stanza();
+    g.finish();
+    std::fclose(f);
+}
+
+// Reading the file as the compiler's reader does, touching every byte.
+double floor_seconds(const std::string &path) {
+    auto t0 = clock_type::now();
+    FILE *f = std::fopen(path.c_str(), "r");
+    char buf[256];
+    unsigned long sum = 0;
+    while (std::fgets(buf, 255, f))
+        for (const char *p = buf; *p; p++)
+            sum += static_cast<unsigned char>(*p);
+    std::fclose(f);
+    double s = std::chrono::duration<double>(clock_type::now() - t0).count();
+    if (sum == 1) // keeps the loop
+        std::puts("");
+    return s;
+}
+
+struct compile_run {
+    double seconds;
+    long max_rss_kb;
+    off_t output_size;
+    int status;
+};
+
+compile_run compile(const std::string &qecfg, const std::string &src, const std::string &out) {
+    auto t0 = clock_type::now();
+    pid_t pid = fork();
+    if (pid == 0) {
+        execl(qecfg.c_str(), "qecfg", src.c_str(), out.c_str(), static_cast<char *>(nullptr));
+        _exit(127);
+    }
+    int st = 0;
+    struct rusage ru {};
+    wait4(pid, &st, 0, &ru);
+    compile_run r{std::chrono::duration<double>(clock_type::now() - t0).count(), ru.ru_maxrss, 0,
+                  WIFEXITED(st) ? WEXITSTATUS(st) : 128};
+    struct stat sb {};
+    if (stat(out.c_str(), &sb) == 0)
+        r.output_size = sb.st_size;
+    return r;
+}
+
+} // namespace
+
+int main(int argc, char **argv) {
+    std::string qecfg = "./qecfg", dir = "/tmp";
+    int runs = 3;
+    std::vector<double> sizes;
+    for (int i = 1; i < argc; i++) {
+        std::string a = argv[i];
+        if (a == "--qecfg" && i + 1 < argc)
+            qecfg = argv[++i];
+        else if (a == "--dir" && i + 1 < argc)
+            dir = argv[++i];
+        else if (a == "--runs" && i + 1 < argc)
+            runs = std::atoi(argv[++i]);
+        else
+            sizes.push_back(std::atof(a.c_str()));
+    }
+    if (sizes.empty())
+        sizes = {1, 10, 100};
+    std::printf("%10s %10s %10s %10s %12s %10s %12s\n", "source MB", "output MB", "seconds", "MB/s", "peak RSS MB",
+                "floor s", "time/floor");
+    for (double mb : sizes) {
+        std::string src = dir + "/qecfg-bench.src", out = dir + "/qecfg-bench.cdef";
+        generate(src, size_t(mb * 1e6));
+        struct stat sb {};
+        stat(src.c_str(), &sb);
+        double best = 1e30, fl = 1e30;
+        compile_run r{};
+        for (int k = 0; k < runs; k++) {
+            fl = std::min(fl, floor_seconds(src));
+            compile_run c = compile(qecfg, src, out);
+            if (c.status != 0) {
+                std::fprintf(stderr, "qecfg failed with status %d\n", c.status);
+                return 1;
+            }
+            if (c.seconds < best)
+                best = c.seconds, r = c;
+        }
+        double src_mb = double(sb.st_size) / 1e6;
+        std::printf("%10.1f %10.1f %10.3f %10.1f %12.1f %10.3f %12.2f\n", src_mb, double(r.output_size) / 1e6, best,
+                    src_mb / best, double(r.max_rss_kb) / 1024.0, fl, best / fl);
+        std::remove(src.c_str());
+        std::remove(out.c_str());
+    }
+    return 0;
+}
