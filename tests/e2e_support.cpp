@@ -39,7 +39,7 @@ static std::vector<std::string> lines(const std::string &text) {
 }
 
 run_result run(const fs::path &work, const std::string &program, const std::vector<std::string> &args,
-               const std::vector<std::string> &env) {
+               const std::vector<std::string> &env, const std::function<void()> &child_setup) {
     run_result r;
     r.work = work;
     fs::path out = work.string() + ".stdout", err = work.string() + ".stderr";
@@ -60,6 +60,8 @@ run_result run(const fs::path &work, const std::string &program, const std::vect
         for (const std::string &kv : env)
             putenv(strdup(kv.c_str()));
         // A fixed program name keeps messages that quote it independent of the build.
+        if (child_setup)
+            child_setup();
         std::vector<char *> argv{const_cast<char *>("qecfg")};
         for (const std::string &a : args)
             argv.push_back(const_cast<char *>(a.c_str()));

@@ -4,6 +4,7 @@
 #define E2E_SUPPORT_H
 
 #include <filesystem>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -23,9 +24,9 @@ std::string read_or(const std::filesystem::path &p, const std::string &dflt);
 run_result run_case(const std::filesystem::path &dir, const std::string &program);
 
 // Runs a program with arguments in a directory; environment additions are
-// NAME=VALUE strings.
+// NAME=VALUE strings; child_setup runs in the child just before the program.
 run_result run(const std::filesystem::path &work, const std::string &program, const std::vector<std::string> &args,
-               const std::vector<std::string> &env);
+               const std::vector<std::string> &env, const std::function<void()> &child_setup = {});
 
 // Removes the working directory of a run and its captured output.
 void remove_run(const run_result &r);
