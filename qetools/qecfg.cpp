@@ -12,7 +12,7 @@ qecfg_compiler::~qecfg_compiler() {
         std::fclose(cdb_fp);
     for (tbl *t : {&rsrc_class_tbl, &rsrc_cmmap_tbl, &rsrc_mgr_tbl, &rsrc_var_class_tbl})
         std::free(t->tbl_base);
-    for (auto &t : owned_tbls)
+    for (tbl *t : owned_tbls)
         std::free(t->tbl_base);
     for (void *p : owned_blocks)
         std::free(p);
@@ -25,6 +25,8 @@ void qecfg_compiler::bind_sc_tables() {
         srtable_ctrl &e = sc_tables[i];
         e = srtable_ctrl{d.name, nullptr, d.num_attrs, nullptr, &c.u_rc_strings, &c.u_rc_variety_lists,
                          &c.u_rc_valid_vals, &c.u_rc_sd_defs, 0, d.req_mask_cmplt, 0, dflt_tbl{}, 0, d.attrs};
+        for (int r = 0; r < d.num_attrs; r++)
+            attr_name_len[i][r] = std::strlen(d.attrs[r].ta_name);
         if (is_SD_stanza(i)) {
             e.sc_cb = &cb_sd_def;
             e.sc_init_tbl = &qecfg_compiler::init_sd_tbl;

@@ -398,6 +398,9 @@ class qecfg_compiler {
     void add_rsrc_var_class_tbls();
     void flush_mapfile();
 
+    // Lengths of the attribute keywords, by stanza type and row.
+    size_t attr_name_len[NUM_STANZA_TYPES][MAX_ATTRS_PER_STANZA] = {};
+
     // reader state
     srtable_ctrl *scp = nullptr;
     srtable_ctrl *prev_scp = nullptr;
@@ -439,8 +442,13 @@ class qecfg_compiler {
     size_t gross_file_size = 0;
     bool output_created = false, output_regular = false;
 
-    std::vector<std::unique_ptr<tbl>> owned_tbls;
+    // Zero-filled memory of the compile, handed out from large chunks: the
+    // copies of value texts and the table objects. Table storage itself is
+    // reallocated as tables grow and freed through owned_tbls.
     std::vector<void *> owned_blocks;
+    char *chunk_next = nullptr;
+    size_t chunk_left = 0;
+    std::vector<tbl *> owned_tbls;
 };
 
 // Trace output of a compile.

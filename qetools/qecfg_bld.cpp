@@ -1,6 +1,7 @@
 // The CDB builder: exact size, the output file extended and mapped, the
 // header, anchors and dsects laid into the mapping, the checksum, and the
 // variable ID tables that group dynamic attributes by variable class.
+#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <fcntl.h>
@@ -187,26 +188,30 @@ char *qecfg_compiler::get_mapfile(size_t cdb_file_size) {
     output_created = true;
     struct stat st;
     output_regular = fstat(fd, &st) == 0 && S_ISREG(st.st_mode);
-    static const char zeros[EXTEND_BLOCK] = {};
+    // Zeros are written, not a hole left, so that a full disk shows here and
+    // not as a fault while the mapping is filled. The image is extended in
+    // whole blocks of EXTEND_BLOCK bytes, written many blocks at a time.
+    static const char zeros[EXTEND_BLOCK * 256] = {};
     gross_file_size = 0;
     while (gross_file_size < cdb_file_size) {
-        size_t done = 0;
-        while (done < EXTEND_BLOCK) {
-            ssize_t n = write(fd, zeros + done, EXTEND_BLOCK - done);
+        size_t blocks = std::min<size_t>((cdb_file_size - gross_file_size + EXTEND_BLOCK - 1) / EXTEND_BLOCK, 256);
+        size_t want = blocks * EXTEND_BLOCK, done = 0;
+        while (done < want) {
+            ssize_t n = write(fd, zeros + done, want - done);
             if (n < 0 && errno == EINTR)
                 continue;
             if (n <= 0)
                 output_error("Cannot extend CDB file: ", n < 0 ? errno : ENOSPC);
             done += size_t(n);
         }
-        gross_file_size += EXTEND_BLOCK;
+        gross_file_size += want;
     }
     if (fstat(fd, &st) != 0)
         output_error("Cannot map CDB file: ", errno);
     if (st.st_size < off_t(cdb_file_size))
         output_error("Cannot map CDB file: ", EINVAL);
     gross_file_size = size_t(st.st_size);
-    void *p = mmap(nullptr, gross_file_size, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
+    void *p = mmap(nullptr, gross_file_size, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_POPULATE, fd, 0);
     if (p == MAP_FAILED)
         output_error("Cannot map CDB file: ", errno);
     cdb_mapfile_ptr = p;

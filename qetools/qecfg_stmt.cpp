@@ -8,8 +8,19 @@ namespace {
 
 constexpr size_t MAX_VALUE_LEN = 1797;
 
-// The integer of a statement: strtol in base 0, truncated by the caller.
-long stmt_int(const char *v) { return std::strtol(v, nullptr, 0); }
+// The integer of a statement: strtol in base 0, truncated by the caller. A
+// short plain decimal number, the usual case, is converted directly.
+long stmt_int(const char *v) {
+    if (v[0] >= '1' && v[0] <= '9') {
+        long n = v[0] - '0';
+        int i = 1;
+        for (; i < 9 && v[i] >= '0' && v[i] <= '9'; i++)
+            n = n * 10 + (v[i] - '0');
+        if (v[i] == '\0')
+            return n;
+    }
+    return std::strtol(v, nullptr, 0);
+}
 
 bool is_unranged_type(zu_data_type_t dt) {
     switch (dt) {
@@ -61,8 +72,9 @@ void qecfg_compiler::save_attr(char *il, int table_id) {
     if (std::strlen(value) > MAX_VALUE_LEN)
         statement_error("Attibute value exceeds maximum length: ", name);
     const table_attrs *row = nullptr;
+    size_t name_len = size_t(eq - name);
     for (int i = 0; i < e->sc_num_attrs_in_table && !row; i++)
-        if (e->sc_attrs[i].ta_name[0] == name[0] && std::strcmp(e->sc_attrs[i].ta_name, name) == 0)
+        if (attr_name_len[table_id][i] == name_len && std::memcmp(e->sc_attrs[i].ta_name, name, name_len) == 0)
             row = &e->sc_attrs[i];
     if (!row)
         statement_error("Attribute name not defined in table (name/table): ", name, e->sc_name);

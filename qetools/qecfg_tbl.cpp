@@ -2,22 +2,40 @@
 // and which are referred to by offsets, because a block moves when it grows.
 #include <cerrno>
 #include <cstdlib>
+#include <new>
 
 #include "qecfg.h"
 
+namespace {
+constexpr size_t CHUNK = size_t(1) << 20;
+constexpr size_t OWN_BLOCK = CHUNK / 16; // larger requests get a block of their own
+} // namespace
+
 void *qecfg_compiler::cfg_malloc(size_t s) {
-    void *p = std::calloc(1, s ? s : 1);
+    size_t need = round8(s ? s : 1);
+    if (need <= chunk_left) {
+        void *p = chunk_next;
+        chunk_next += need;
+        chunk_left -= need;
+        return p;
+    }
+    size_t block = need > OWN_BLOCK ? need : CHUNK;
+    void *p = std::calloc(1, block);
     if (!p) {
         int e = errno;
         qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(e), nullptr, 0, e);
     }
     owned_blocks.push_back(p);
+    if (block == CHUNK) {
+        chunk_next = static_cast<char *>(p) + need;
+        chunk_left = CHUNK - need;
+    }
     return p;
 }
 
 tbl *qecfg_compiler::new_tbl(const char *name, size_t au) {
-    owned_tbls.push_back(std::make_unique<tbl>());
-    tbl *t = owned_tbls.back().get();
+    tbl *t = new (cfg_malloc(sizeof(tbl))) tbl{};
+    owned_tbls.push_back(t);
     t->tbl_au = au;
     t->tbl_name = name;
     return t;

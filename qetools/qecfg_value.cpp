@@ -139,7 +139,7 @@ zu_data_type_t strToZuDt(const char *s) {
     if (!s)
         return ZU_UNKNOWN;
     for (unsigned i = 0; i < ZU_NUM_DATA_TYPES; ++i)
-        if (std::strcmp(s, zuTypeStr[i]) == 0)
+        if (s[0] == zuTypeStr[i][0] && std::strcmp(s, zuTypeStr[i]) == 0)
             return static_cast<zu_data_type_t>(i);
     return ZU_UNKNOWN;
 }
