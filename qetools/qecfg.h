@@ -389,6 +389,7 @@ class qecfg_compiler {
     [[noreturn]] void output_error(const char *msg, int err);
     char *get_mapfile(size_t cdb_file_size);
     void begin_dsect(cdb_dsect_type_t type);
+    char *copy_record(cdb_dsect_type_t type, const char *src, size_t size);
     void grow_dsect(size_t len);
     void copy_table(char *rec, size_t ref_field, const tbl *t, bool rounded);
     void note_numeric_ranges(const tbl *t);

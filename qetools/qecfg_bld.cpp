@@ -232,6 +232,15 @@ void qecfg_compiler::grow_dsect(size_t len) {
     dsp += len;
 }
 
+// Starts the dsect of one record: its anchor, then the record itself.
+char *qecfg_compiler::copy_record(cdb_dsect_type_t type, const char *src, size_t size) {
+    begin_dsect(type);
+    char *rec = dsp;
+    std::memcpy(rec, src, size);
+    grow_dsect(size);
+    return rec;
+}
+
 // Copies a table behind the record and points the record's reference at it.
 void qecfg_compiler::copy_table(char *rec, size_t ref_field, const tbl *t, bool rounded) {
     cdb_ref_t ref{};
@@ -258,10 +267,7 @@ void qecfg_compiler::add_rsrc_class_tbls() {
     };
     for (size_t i = 0; i < n; i++) {
         const char *src = rsrc_class_tbl.tbl_base + i * sizeof(rsrc_class_t);
-        begin_dsect(CDB_DSECT_CLASS);
-        char *rec = dsp;
-        std::memcpy(rec, src, sizeof(rsrc_class_t));
-        grow_dsect(sizeof(rsrc_class_t));
+        char *rec = copy_record(CDB_DSECT_CLASS, src, sizeof(rsrc_class_t));
         for (size_t field : copied) {
             const tbl *t = ref_tbl(src, field);
             if (field == offsetof(rsrc_class_t, u_rc_dattrsC) || field == offsetof(rsrc_class_t, u_rc_dattrs))
@@ -293,10 +299,7 @@ void qecfg_compiler::add_rsrc_mgr_tbls() {
         bld_error_exit("No Rsrc Manager tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
         const char *src = rsrc_mgr_tbl.tbl_base + i * sizeof(rsrc_mgr_t);
-        begin_dsect(CDB_DSECT_RSRC_MGR);
-        char *rec = dsp;
-        std::memcpy(rec, src, sizeof(rsrc_mgr_t));
-        grow_dsect(sizeof(rsrc_mgr_t));
+        char *rec = copy_record(CDB_DSECT_RSRC_MGR, src, sizeof(rsrc_mgr_t));
         copy_table(rec, offsetof(rsrc_mgr_t, u_rm_strings_table), ref_tbl(src, offsetof(rsrc_mgr_t, u_rm_strings_table)),
                    true);
         // The name is the first string, and the strings follow the record.
@@ -315,10 +318,7 @@ void qecfg_compiler::add_rsrc_cmmap_tbls() {
         bld_error_exit("No Rsrc CMMAP tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
         const char *src = rsrc_cmmap_tbl.tbl_base + i * sizeof(rsrc_cmmap_t);
-        begin_dsect(CDB_DSECT_CMMAP);
-        char *rec = dsp;
-        std::memcpy(rec, src, sizeof(rsrc_cmmap_t));
-        grow_dsect(sizeof(rsrc_cmmap_t));
+        char *rec = copy_record(CDB_DSECT_CMMAP, src, sizeof(rsrc_cmmap_t));
         copy_table(rec, offsetof(rsrc_cmmap_t, u_rcm_strings), ref_tbl(src, offsetof(rsrc_cmmap_t, u_rcm_strings)), true);
         dsect_idx++;
     }
@@ -330,10 +330,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         bld_error_exit("No Rsrc Variable Class tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
         const char *src = rsrc_var_class_tbl.tbl_base + i * sizeof(rsrc_variable_class_t);
-        begin_dsect(CDB_DSECT_VAR_CLASS);
-        char *rec = dsp;
-        std::memcpy(rec, src, sizeof(rsrc_variable_class_t));
-        grow_dsect(sizeof(rsrc_variable_class_t));
+        char *rec = copy_record(CDB_DSECT_VAR_CLASS, src, sizeof(rsrc_variable_class_t));
         const tbl *strings = ref_tbl(src, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
         size_t len = tbl_used(strings);
         memcpy_8_rounded(dsp, strings ? strings->tbl_base : nullptr, len);

@@ -308,20 +308,7 @@ void qecfg_compiler::store_range(srtable_ctrl *e, int table_id, char *target, ch
         dattrC_range_found = 1;
     if (!std::strchr(v, ','))
         statement_error("Range requires two values");
-    value_slot low = value_slot::at(target);
-    value_slot high = value_slot::at(target + sizeof(zu_value_t));
-    char *comma = std::strchr(v, ',');
-    *comma = '\0';
-    zu_data_type_t stype = scalar_zu(dt);
-    tbl *st = entry_tbl(e->sc_str_tbl);
-    zu_value_t val{};
-    if (str_to_zu(&val, dt, comma + 1) != 0)
-        statement_error("str_to_zu: Invalid data");
-    if (copy_this_type(high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-        statement_error("copy_this_type error");
-    val = zu_value_t{};
-    if (str_to_zu(&val, dt, v) != 0 || copy_this_type(low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-        statement_error("str_to_zu: Invalid data");
+    place_pair(dt, v, value_slot::at(target), value_slot::at(target + sizeof(zu_value_t)), entry_tbl(e->sc_str_tbl));
 }
 
 // The element statements of the structured-data stanzas fill the element
