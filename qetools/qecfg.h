@@ -63,6 +63,7 @@ struct table_attrs {
 };
 
 constexpr uint32_t OPTIONAL_BIT = 0x80000000;
+inline constexpr const char *DEFAULT_VALUES_TBL = "DefaultValues";
 constexpr int MAX_ATTRS_PER_STANZA = 25;
 
 struct dflt_tbl {
@@ -338,6 +339,7 @@ class qecfg_compiler {
     // reader
     void handle_header(char *line, int &table_id);
     void complete_open_actions();
+    void drop_dflt(dflt_tbl &d);
     void finish_open_records();
     void build_manager();
 
@@ -392,6 +394,7 @@ class qecfg_compiler {
     char *copy_record(cdb_dsect_type_t type, const char *src, size_t size);
     void grow_dsect(size_t len);
     void copy_table(char *rec, size_t ref_field, const tbl *t, bool rounded);
+    void release_storage(const tbl *t);
     void note_numeric_ranges(const tbl *t);
     void add_rsrc_class_tbls();
     void add_rsrc_mgr_tbls();
@@ -450,6 +453,7 @@ class qecfg_compiler {
     char *chunk_next = nullptr;
     size_t chunk_left = 0;
     std::vector<tbl *> owned_tbls;
+    std::vector<tbl *> free_tbls; // emptied default lists, for new_tbl to reuse
 };
 
 // Trace output of a compile.

@@ -211,7 +211,7 @@ char *qecfg_compiler::get_mapfile(size_t cdb_file_size) {
     if (st.st_size < off_t(cdb_file_size))
         output_error("Cannot map CDB file: ", EINVAL);
     gross_file_size = size_t(st.st_size);
-    void *p = mmap(nullptr, gross_file_size, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_POPULATE, fd, 0);
+    void *p = mmap(nullptr, gross_file_size, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
     if (p == MAP_FAILED)
         output_error("Cannot map CDB file: ", errno);
     cdb_mapfile_ptr = p;
@@ -252,6 +252,18 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, const tbl *t, bool 
     else if (len)
         std::memcpy(dsp, t->tbl_base, len);
     grow_dsect(rounded ? round8(len) : len);
+    release_storage(t);
+}
+
+// Once its bytes are in the image a table's storage is given back, so that
+// the tables and the image are not both held in memory in full.
+void qecfg_compiler::release_storage(const tbl *t) {
+    tbl *owned = const_cast<tbl *>(t);
+    if (!owned || !owned->tbl_base)
+        return;
+    std::free(owned->tbl_base);
+    owned->tbl_base = owned->tbl_prev_base = owned->tbl_next = owned->tbl_end = nullptr;
+    owned->tbl_size = owned->tbl_cap = 0;
 }
 
 void qecfg_compiler::add_rsrc_class_tbls() {
@@ -335,6 +347,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         size_t len = tbl_used(strings);
         memcpy_8_rounded(dsp, strings ? strings->tbl_base : nullptr, len);
         grow_dsect(round8(len));
+        release_storage(strings);
         // The reference holds the rounded string length: the IDs follow.
         cdb_ref_t ref{};
         ref.offset[0] = uint32_t(round8(len));
@@ -342,6 +355,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         if (const tbl *ids = find_tbl_entry(src)) {
             memcpy_8_rounded(dsp, ids->tbl_base, tbl_used(ids));
             grow_dsect(round8(tbl_used(ids)));
+            release_storage(ids);
         }
         dsect_idx++;
     }

@@ -2,6 +2,7 @@
 // characters, comment removal, stanza framing and dispatch of statements.
 #include <array>
 #include <cerrno>
+#include <cstdlib>
 #include <vector>
 
 #include "qecfg.h"
@@ -206,9 +207,22 @@ void qecfg_compiler::handle_header(char *line, int &table_id) {
     complete_open_actions();
     (this->*scp->sc_init_tbl)();
     scp->req_mask = scp->opt_mask = 0;
-    scp->dflt = dflt_tbl{};
+    drop_dflt(scp->dflt);
     attr_dflt_val = max_sd_idx = nullptr;
     curr_sd_tbl = nullptr;
+}
+
+// Empties a stanza's default list. A list of default values belongs to its
+// stanza alone and is spent once the record is completed, so its table is
+// kept for reuse; the element type lists of structured attributes are shared
+// with the structured-data stanzas and are left alone.
+void qecfg_compiler::drop_dflt(dflt_tbl &d) {
+    if (d.tbl && d.tbl->tbl_name == DEFAULT_VALUES_TBL) {
+        std::free(d.tbl->tbl_base);
+        *d.tbl = tbl{};
+        free_tbls.push_back(d.tbl);
+    }
+    d = dflt_tbl{};
 }
 
 void qecfg_compiler::complete_open_actions() {

@@ -260,7 +260,7 @@ void qecfg_compiler::store_default(srtable_ctrl *e, const char *v) {
     if (dt == ZU_SD_PTR || dt == ZU_SD_PTR_ARRAY)
         statement_error("Default values not expected; place default values in individual *SDDef stanzas.");
     if (!e->dflt.tbl)
-        e->dflt.tbl = new_tbl("DefaultValues", 32);
+        e->dflt.tbl = new_tbl(DEFAULT_VALUES_TBL, 32);
     char *slot = static_cast<char *>(alloc_tble(e->dflt.tbl, sizeof(zu_value_t)));
     zu_value_t val{};
     if (str_to_zu(&val, dt, v) != 0)

@@ -34,8 +34,15 @@ void *qecfg_compiler::cfg_malloc(size_t s) {
 }
 
 tbl *qecfg_compiler::new_tbl(const char *name, size_t au) {
-    tbl *t = new (cfg_malloc(sizeof(tbl))) tbl{};
-    owned_tbls.push_back(t);
+    tbl *t;
+    if (!free_tbls.empty()) {
+        t = free_tbls.back();
+        free_tbls.pop_back();
+        *t = tbl{};
+    } else {
+        t = new (cfg_malloc(sizeof(tbl))) tbl{};
+        owned_tbls.push_back(t);
+    }
     t->tbl_au = au;
     t->tbl_name = name;
     return t;
