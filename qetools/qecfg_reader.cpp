@@ -139,13 +139,29 @@ int qecfg_compiler::set_table_id(const char *name) const {
     return -1;
 }
 
+namespace {
+
+// Which stanza types are structured-data ones, and of those which belong to
+// attributes, by the names of the types.
+struct stanza_kinds {
+    bool sd[NUM_STANZA_TYPES] = {}, attr_sd[NUM_STANZA_TYPES] = {};
+    stanza_kinds() {
+        for (int i = 0; i < NUM_STANZA_TYPES; i++) {
+            sd[i] = std::strstr(stanza_defs[i].name, "SDDefinition") != nullptr;
+            attr_sd[i] = std::strstr(stanza_defs[i].name, "AttrSDDefinition") != nullptr;
+        }
+    }
+};
+const stanza_kinds kinds_of_stanzas;
+
+} // namespace
+
 bool qecfg_compiler::is_SD_stanza(int table_id) {
-    return table_id >= 0 && table_id < NUM_STANZA_TYPES && std::strstr(stanza_defs[table_id].name, "SDDefinition");
+    return table_id >= 0 && table_id < NUM_STANZA_TYPES && kinds_of_stanzas.sd[table_id];
 }
 
 bool qecfg_compiler::is_attr_SD(int table_id) {
-    return table_id >= 0 && table_id < NUM_STANZA_TYPES &&
-           std::strstr(stanza_defs[table_id].name, "AttrSDDefinition");
+    return table_id >= 0 && table_id < NUM_STANZA_TYPES && kinds_of_stanzas.attr_sd[table_id];
 }
 
 sd_type_t qecfg_compiler::SD_stanza_type(int table_id) {
