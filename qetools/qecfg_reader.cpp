@@ -91,9 +91,9 @@ bool strip_comments(char *line) {
     for (;; p++) {
         switch (char_classes[static_cast<unsigned char>(*p)]) {
         case ORDINARY:
-            // Runs of ordinary text are skipped at the speed of strcspn.
             non_blank = 1;
-            p += std::strcspn(p, " \t\n\"#/") - 1;
+            while (char_classes[static_cast<unsigned char>(p[1])] == ORDINARY)
+                p++;
             continue;
         case BLANK: continue;
         case QUOTE: dbl_quote++; continue;

@@ -1,6 +1,7 @@
 // Growable tables: named, zero-filled blocks to which items are only appended
 // and which are referred to by offsets, because a block moves when it grows.
 #include <cerrno>
+#include <algorithm>
 #include <cstdlib>
 #include <new>
 
@@ -9,6 +10,8 @@
 namespace {
 constexpr size_t CHUNK = size_t(1) << 20;
 constexpr size_t OWN_BLOCK = CHUNK / 16; // larger requests get a block of their own
+constexpr size_t LARGE_TABLE = size_t(32) << 10;
+constexpr size_t LARGE_BLOCK = size_t(1) << 20;
 } // namespace
 
 void *qecfg_compiler::cfg_malloc(size_t s) {
@@ -55,6 +58,10 @@ static bool reserve_block(tbl *t, size_t need) {
     size_t cap = t->tbl_cap ? t->tbl_cap : need;
     while (cap < need)
         cap = cap < (size_t(1) << 62) ? cap * 2 : need;
+    // A table that has grown large jumps to a block that the allocator maps
+    // on its own, which then grows without being copied.
+    if (cap > LARGE_TABLE)
+        cap = std::max(cap, LARGE_BLOCK);
     char *nb = static_cast<char *>(std::realloc(t->tbl_base, cap));
     if (!nb)
         return false;

@@ -165,7 +165,9 @@ int is_zu_array(zu_data_type_t dt) { return zu_is_array_type(dt) ? 1 : 0; }
 char *strip_quotes(char *s) {
     if (!s)
         return nullptr;
-    char *open = s + std::strspn(s, " \t");
+    char *open = s;
+    while (*open == ' ' || *open == '\t')
+        ++open;
     if (*open != '"')
         return s;
     size_t len = std::strlen(open);
