@@ -533,6 +533,44 @@ static_assert(offsetof(cdb_dsect_anchor_t, cda_offset) == 4);
 static_assert(offsetof(cdb_dsect_anchor_t, cda_length) == 8);
 static_assert(offsetof(cdb_dsect_anchor_t, cda_revision) == 12);
 
+// The source keywords of the property bits and the permission letters that
+// records carry (rc_props, ra_props, ac_props, ac_perms), in the order the
+// source language lists them.
+struct props_t {
+    char s[20];
+    uint32_t p;
+};
+
+inline constexpr props_t rc_props[] = {
+    {"MtypDivided", 0x2000},     {"MtypCentral", 0x4000},     {"MtypGlobal", 0x8000},  {"QELElectCoord", 0x100},
+    {"HasResources", 0x2},       {"HasConstraints", 0x80},    {"CanControl", 0x4},     {"CanDefine", 0x8},
+    {"JoinPhase0", 0x10},        {"JoinPhase1", 0x20},        {"SupportsMove", 0x200}, {"CanBatchDefine", 0x400},
+    {"CanBatchUndefine", 0x800}, {"CanBatchSetAttr", 0x1000}, {"HasIWAccess", 0x1},    {"QryReqsMonitoring", 0x20000},
+    {"CanLiveUpdate", 0x40000},
+};
+inline constexpr props_t pa_props[] = {
+    {"Public", 0x20},      {"Select", 0x10},        {"ReqdForDefine", 0x2},
+    {"OptForDefine", 0x8}, {"InvalForDefine", 0x4}, {"ReadOnly", 0x1},
+};
+inline constexpr props_t da_props[] = {{"Public", 0x20}, {"QryReqsMonitoring", 0x40}};
+inline constexpr props_t act_props[] = {{"Public", 0x2}, {"LongRun", 0x1}};
+inline constexpr int rc_props_cnt = 17, pa_props_cnt = 6, da_props_cnt = 2, act_props_cnt = 2;
+
+struct valid_perms_t {
+    char permission;
+    uint32_t mask;
+};
+
+inline constexpr valid_perms_t perm_list[] = {
+    {'q', 0x1}, {'l', 0x2}, {'e', 0x4}, {'v', 0x8}, {'d', 0x10}, {'c', 0x20}, {'s', 0x40}, {'o', 0x80}, {'a', 0x100},
+    {'x', 0x200},
+};
+inline constexpr int num_perm_list = 10;
+
+static_assert(sizeof(rc_props) / sizeof(rc_props[0]) == rc_props_cnt);
+static_assert(sizeof(pa_props) / sizeof(pa_props[0]) == pa_props_cnt);
+static_assert(sizeof(perm_list) / sizeof(perm_list[0]) == num_perm_list);
+
 constexpr size_t CDB_HEADER_SIZE = sizeof(qel_cdb_header_t);
 constexpr size_t CDB_ANCHOR_SIZE = sizeof(cdb_dsect_anchor_t);
 

@@ -115,24 +115,6 @@ enum stanza_idx {
     NUM_STANZA_TYPES
 };
 
-struct props_t {
-    char s[20];
-    uint32_t p;
-};
-
-struct valid_perms_t {
-    char permission;
-    uint32_t mask;
-};
-
-extern const props_t rc_props[];
-extern const props_t pa_props[];
-extern const props_t da_props[];
-extern const props_t act_props[];
-extern const int rc_props_cnt, pa_props_cnt, da_props_cnt, act_props_cnt;
-extern const valid_perms_t perm_list[];
-extern const int num_perm_list;
-
 // The static part of one stanza type: everything but the bindings into the
 // control blocks of a compile.
 struct stanza_def {

@@ -1,0 +1,48 @@
+// Names that the file does not hold: the source keywords of property bits and
+// permission letters, data and variable type names, dsect kinds.
+#ifndef CDBDUMP_CDB_NAMES_H
+#define CDBDUMP_CDB_NAMES_H
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "cdb.h"
+
+namespace cdbdump {
+
+// A keyword table of cdb.h: property keywords, or permission letters as
+// one-character keywords.
+struct prop_table {
+    const props_t *entries;
+    int count;
+};
+
+extern const prop_table class_props;  // ResourceClass Properties
+extern const prop_table pattr_props;  // persistent attribute Properties
+extern const prop_table dattr_props;  // dynamic attribute Properties
+extern const prop_table action_props; // action Properties
+extern const prop_table perm_letters; // action Permission (one-letter names)
+
+// The keywords whose bits are set, in table order.
+std::vector<std::string> prop_names(const prop_table &t, uint32_t bits);
+// The bits that no keyword of the table has.
+uint32_t unnamed_bits(const prop_table &t, uint32_t bits);
+
+// Source name of a data type; "type N" outside 0..22.
+std::string data_type_name(uint32_t dt);
+std::string var_type_name(uint32_t vt);
+// "class", "manager", "map", "variable_class", or "type N".
+std::string dsect_kind_name(uint32_t type);
+
+inline bool is_array_type(uint32_t dt) { return dt >= 13 && dt <= 22; }
+inline uint32_t element_type(uint32_t dt) { return is_array_type(dt) ? dt - 11 : dt; }
+inline bool is_numeric_type(uint32_t dt) { return dt >= 2 && dt <= 7; }
+inline bool is_wide_type(uint32_t dt) { return dt == 4 || dt == 5 || dt == 7; }
+inline bool is_sd_type(uint32_t dt) { return dt == 11 || dt == 22; }
+// 100 in a numeric type (2 to 7): the high end of a range that no statement gave.
+inline uint64_t hundred_bits(uint32_t dt) { return dt == 6 ? 0x42c80000u : dt == 7 ? 0x4059000000000000ull : 100; }
+
+} // namespace cdbdump
+
+#endif

@@ -1,0 +1,101 @@
+#include "cdb_text.h"
+
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+
+namespace cdbdump {
+
+std::string hex(uint64_t v) {
+    char buf[24];
+    std::snprintf(buf, sizeof buf, "0x%llx", static_cast<unsigned long long>(v));
+    return buf;
+}
+
+std::string hexdec(uint64_t v) { return hex(v) + " (" + std::to_string(v) + ")"; }
+
+std::string hex_digits(const uint8_t *p, size_t n) {
+    static const char digits[] = "0123456789abcdef";
+    std::string s;
+    s.reserve(2 * n);
+    for (size_t i = 0; i < n; i++) {
+        s += digits[p[i] >> 4];
+        s += digits[p[i] & 15];
+    }
+    return s;
+}
+
+namespace {
+// Escapes shared by both quoting styles; the rest differs in how a control
+// byte is spelled.
+std::string quote_with(const std::string &s, const char *control_fmt) {
+    std::string out = "\"";
+    for (unsigned char c : s) {
+        switch (c) {
+        case '"': out += "\\\""; break;
+        case '\\': out += "\\\\"; break;
+        case '\n': out += "\\n"; break;
+        case '\t': out += "\\t"; break;
+        case '\r': out += "\\r"; break;
+        default:
+            if (c < 0x20 || c == 0x7f) {
+                char buf[8];
+                std::snprintf(buf, sizeof buf, control_fmt, c);
+                out += buf;
+            } else {
+                out += char(c);
+            }
+        }
+    }
+    return out + "\"";
+}
+} // namespace
+
+std::string c_quote(const std::string &s) { return quote_with(s, "\\x%02x"); }
+
+// Bytes from 0x80 up are passed through: a JSON reader that wants UTF-8 gets
+// exactly the bytes the file holds.
+std::string json_quote(const std::string &s) { return quote_with(s, "\\u%04x"); }
+
+namespace {
+template <typename F> std::string special_float(F f) {
+    if (std::isnan(f)) return std::signbit(f) ? "-nan" : "nan";
+    return std::signbit(f) ? "-inf" : "inf";
+}
+} // namespace
+
+std::string float32_text(uint32_t bits) {
+    float f;
+    std::memcpy(&f, &bits, sizeof f);
+    if (!std::isfinite(f)) return special_float(f);
+    char buf[48];
+    std::snprintf(buf, sizeof buf, "%.9g", double(f));
+    return buf;
+}
+
+std::string float64_text(uint64_t bits) {
+    double d;
+    std::memcpy(&d, &bits, sizeof d);
+    if (!std::isfinite(d)) return special_float(d);
+    char buf[48];
+    std::snprintf(buf, sizeof buf, "%.17g", d);
+    return buf;
+}
+
+std::string number_text(uint32_t type, uint64_t bits) {
+    switch (type) {
+    case 2: return std::to_string(int32_t(uint32_t(bits)));
+    case 3: return std::to_string(uint32_t(bits));
+    case 4: return std::to_string(int64_t(bits));
+    case 5: return std::to_string(bits);
+    case 6: return float32_text(uint32_t(bits));
+    default: return float64_text(bits);
+    }
+}
+
+std::string version_text(uint32_t v) {
+    return std::to_string(v >> 24) + "." + std::to_string((v >> 16) & 0xff) + "." + std::to_string((v >> 8) & 0xff) +
+           "." + std::to_string(v & 0xff);
+}
+
+} // namespace cdbdump

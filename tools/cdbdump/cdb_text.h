@@ -1,0 +1,26 @@
+// Small text helpers shared by the reader's labels and the printers.
+#ifndef CDBDUMP_CDB_TEXT_H
+#define CDBDUMP_CDB_TEXT_H
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace cdbdump {
+
+std::string hex(uint64_t v);                        // 0x2a
+std::string hexdec(uint64_t v);                     // 0x2a (42)
+std::string hex_digits(const uint8_t *p, size_t n); // 00ff10, no prefix
+std::string c_quote(const std::string &s);          // "a\tb", with C escapes
+std::string json_quote(const std::string &s);       // "a\tb", with JSON escapes
+// The float text that reads back to the same bits: %.9g / %.17g, inf, nan.
+std::string float32_text(uint32_t bits);
+std::string float64_text(uint64_t bits);
+// A number of data type 2 to 7 from its 32- or 64-bit pattern.
+std::string number_text(uint32_t type, uint64_t bits);
+// A version word as its four dotted parts.
+std::string version_text(uint32_t v);
+
+} // namespace cdbdump
+
+#endif

@@ -1,0 +1,61 @@
+// A document tree: the one description of a CDB's content from which both the
+// text output and the JSON output are rendered.
+#ifndef CDBDUMP_CDB_TREE_H
+#define CDBDUMP_CDB_TREE_H
+
+#include <cstdint>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace cdbdump {
+
+class node {
+  public:
+    enum class kind { null, integer, real, string, token, array, object };
+
+    static node null() { return node(kind::null, ""); }
+    static node integer(int64_t v) { return node(kind::integer, std::to_string(v)); }
+    static node uinteger(uint64_t v) { return node(kind::integer, std::to_string(v)); }
+    // An integer that the text output also shows in hexadecimal.
+    static node flags(uint64_t v);
+    static node real(std::string text) { return node(kind::real, std::move(text)); }
+    static node string(std::string s) { return node(kind::string, std::move(s)); }
+    // Text shown as it is in the text output and as a string in JSON.
+    static node token(std::string s) { return node(kind::token, std::move(s)); }
+    static node array() { return node(kind::array, ""); }
+    static node object() { return node(kind::object, ""); }
+
+    node &add(std::string key, node v) {
+        members_.emplace_back(std::move(key), std::move(v));
+        return *this;
+    }
+    node &push(node v) {
+        items_.push_back(std::move(v));
+        return *this;
+    }
+    node *find(const std::string &key);
+    void erase(const std::string &key);
+
+    kind type() const { return kind_; }
+    const std::string &text() const { return text_; }
+    const std::string &hex_text() const { return hex_; }
+    const std::vector<std::pair<std::string, node>> &members() const { return members_; }
+    const std::vector<node> &items() const { return items_; }
+
+  private:
+    node(kind k, std::string text) : kind_(k), text_(std::move(text)) {}
+    kind kind_;
+    std::string text_;
+    std::string hex_;
+    std::vector<std::pair<std::string, node>> members_;
+    std::vector<node> items_;
+};
+
+std::string to_json(const node &n);
+// An indented "key: value" rendering; short lists and records on one line.
+std::string to_text(const node &n);
+
+} // namespace cdbdump
+
+#endif
