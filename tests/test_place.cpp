@@ -94,6 +94,8 @@ struct number_case {
     zu_value_t given;
     string written[5];
 };
+void PrintTo(const number_case &k, std::ostream *os) { *os << "type " << k.type; }
+
 
 // A given number in the first bytes of its value; the bytes after it are a
 // pattern that must not reach the field.
@@ -279,6 +281,8 @@ struct array_default_case {
     int code;
     string element;
 };
+void PrintTo(const array_default_case &k, std::ostream *os) { *os << "type " << k.type << ", code " << k.code; }
+
 
 class PlaceArrayDefault : public Place, public ::testing::WithParamInterface<array_default_case> {};
 

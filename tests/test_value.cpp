@@ -55,6 +55,9 @@ struct int_case {
     bool ok;
     uint64_t bits; // val_uint32 or val_uint64, by the type's width
 };
+// Test names show the value text, not the bytes of the case.
+void PrintTo(const int_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
+
 
 class ValueInteger : public ValueConvert, public ::testing::WithParamInterface<int_case> {};
 
@@ -107,6 +110,9 @@ struct float_case {
     bool ok;
     double value; // compared as the type's own width
 };
+// Test names show the value text, not the bytes of the case.
+void PrintTo(const float_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
+
 
 class ValueFloat : public ValueConvert, public ::testing::WithParamInterface<float_case> {};
 
@@ -186,6 +192,9 @@ struct binary_case {
     bool ok;
     string bytes;
 };
+// Test names show the value text, not the bytes of the case.
+void PrintTo(const binary_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
+
 
 class ValueBinary : public ValueConvert, public ::testing::WithParamInterface<binary_case> {};
 
