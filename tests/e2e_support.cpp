@@ -58,7 +58,10 @@ run_result run(const fs::path &work, const std::string &program, const std::vect
         setenv("ZU_CDB_FORCE_EMPTY_TIMESTAMP", "1", 1);
         unsetenv("SOURCE_DATE_EPOCH");
         for (const std::string &kv : env)
-            putenv(strdup(kv.c_str()));
+            if (kv[0] == '-')
+                unsetenv(kv.c_str() + 1);
+            else
+                putenv(strdup(kv.c_str()));
         // A fixed program name keeps messages that quote it independent of the build.
         if (child_setup)
             child_setup();

@@ -7,8 +7,9 @@
 //   status      expected exit status (default 0)
 //   stdout      expected standard output, exactly (default empty)
 //   stderr      expected standard error, exactly (default empty)
-//   env         NAME=VALUE lines added to the environment
-//               (ZU_CDB_FORCE_EMPTY_TIMESTAMP=1 is always set)
+//   env         NAME=VALUE lines added to the environment, -NAME lines
+//               removing a variable (ZU_CDB_FORCE_EMPTY_TIMESTAMP=1 is set
+//               unless removed)
 //   checks      lines "FILE u8|u16|u32|u64 OFFSET VALUE", "FILE bytes OFFSET HEX",
 //               "FILE size N", "FILE absent", "FILE str OFFSET TEXT"
 //   FILE.hex    the whole expected content of FILE, as hexadecimal
