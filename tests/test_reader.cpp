@@ -86,37 +86,11 @@ TEST(Reader, NulByteEndsTheLine) {
     EXPECT_EQ(class_string(r.cdb, 8), "Te");
 }
 
-TEST(Driver, MessagesWithoutNewlineUnderN) {
-    compile_result r = compile_text("Bogus\n", [](qecfg_options &o) { o.interactive = 0; });
-    EXPECT_EQ(r.message, "1: Invalid table name: Bogus");
-    EXPECT_EQ(r.code, 1);
-}
-
-TEST(Driver, StatementTracesAtLevelTwo) {
-    compile_result r = compile_text("ControlDefinition\n    FileVersion=2.1\n", [](qecfg_options &o) { o.debugLevel = 2; });
-    EXPECT_EQ(r.out, "ControlDefinition: found attr: \"FileVersion\", value: \"2.1\",length: 3\n"
-                     "Added 1 to mask, which is now 1\n");
-    EXPECT_EQ(r.message, "No class-to-manager maps defined\n");
-}
-
 TEST(Driver, OptionalStatementsAddNoMaskTrace) {
     compile_result r = compile_text(BASE_SOURCE, [](qecfg_options &o) { o.debugLevel = 2; });
     EXPECT_NE(r.out.find("ResourceClass: found attr: \"Name\", value: \"Test.Class\",length: 10\n"
                          "ClassToManagerMapping"),
               std::string::npos);
-}
-
-TEST(Driver, FailedCompileLeavesExistingOutputUntouched) {
-    namespace fs = std::filesystem;
-    fs::path out = fs::temp_directory_path() / ("qecfg-keep-" + std::to_string(getpid()) + ".cdef");
-    std::ofstream(out) << "old";
-    compile_result r = compile_text("Bogus\n", [&](qecfg_options &o) { o.cdefname = out.string(); });
-    EXPECT_EQ(r.code, 1);
-    std::ifstream in(out);
-    std::string s;
-    in >> s;
-    EXPECT_EQ(s, "old");
-    fs::remove(out);
 }
 
 } // namespace
