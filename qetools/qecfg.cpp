@@ -1,6 +1,8 @@
 // One compile: binding of the keyword table to this compile's control blocks,
 // the compile sequence after the source has been read, and the error exits.
+#include <cerrno>
 #include <cstdlib>
+#include <new>
 
 #include "qecfg.h"
 
@@ -120,6 +122,16 @@ void qecfg_compiler::build_manager() {
 }
 
 void qecfg_compiler::run() {
+    try {
+        compile();
+    } catch (const std::bad_alloc &) {
+        // Memory taken by the library's containers runs out like a table's.
+        release_output(true);
+        qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
+    }
+}
+
+void qecfg_compiler::compile() {
     cache_input_data(opt.cdefsrc.c_str());
     finish_open_records();
     if (!cb_rsrc_class.rc_cb_ID)

@@ -314,6 +314,7 @@ class qecfg_compiler {
     uint32_t rsrc_class_count = 0, rsrc_cmmap_count = 0, rsrc_mgr_count = 0, rsrc_var_class_count = 0;
 
   private:
+    void compile();
     void bind_sc_tables();
     tbl *entry_tbl(const cdb_ref_t *field) const;
     [[noreturn]] void statement_error(const char *msg, const char *v1 = nullptr, const char *v2 = nullptr);

@@ -3,6 +3,7 @@
 // file.
 #include <gtest/gtest.h>
 
+#include <cerrno>
 #include <csignal>
 #include <sys/resource.h>
 #include <sys/stat.h>
@@ -62,6 +63,27 @@ TEST_F(OutputFault, FifoIsRefusedAndKept) {
     EXPECT_EQ(r.status, 1);
     EXPECT_EQ(r.err, "Cannot map CDB file: Invalid argument\n");
     EXPECT_TRUE(fs::is_fifo(work / "f.cdef"));
+}
+
+TEST_F(OutputFault, MemoryExhaustionStopsWithItsErrorNumber) {
+#if defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizer runtime needs more address space than the limit leaves";
+#else
+    // One attribute whose array default needs far more memory than allowed.
+    std::ofstream src(work / "input.src", std::ios::app);
+    src << "PersistentResourceAttribute\n    Name=big\n    Description=1\n    DisplayName=2\n    Id=99\n"
+           "    DataType=StringArray\n    VarietyRange=1,1\n";
+    for (int i = 0; i < 100000; i++)
+        src << "    DefaultValue=" << std::string(200, 'v') << i << "\n";
+    src.close();
+    e2e::run_result r = compile("out.cdef", [] {
+        struct rlimit rl{32 << 20, 32 << 20};
+        setrlimit(RLIMIT_AS, &rl);
+    });
+    EXPECT_EQ(r.status, ENOMEM);
+    EXPECT_NE(r.err.find(": Cannot allocate memory\n"), std::string::npos) << r.err;
+    EXPECT_FALSE(fs::exists(work / "out.cdef"));
+#endif
 }
 
 TEST_F(OutputFault, ExistingOutputIsKeptWhenTheSourceFails) {
