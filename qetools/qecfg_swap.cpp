@@ -237,15 +237,23 @@ void swap_sd_def(const swap_image &img, size_t sd_pos, size_t vvbase, size_t sba
     swap_spots(img, sd_pos, {NUM(sd_def_t, sd_cb_ID), NUM(sd_def_t, sd_count)});
 }
 
+// What both attribute records refer to: the variety list, the valid values,
+// the structured-data definition, and their own value (default or initial).
+// Returns the record's data type, read before anything was reversed.
+template <typename R>
+zu_data_type_t swap_attr_lists_and_value(const swap_image &img, size_t rec, size_t value_field, const swap_bases &b) {
+    const zu_data_type_t type = load_type(img, rec + offsetof(R, ra_data_type));
+    walk_var_list(img, rec + offsetof(R, u_ra_variety_list), b);
+    walk_valid_vals(img, rec + offsetof(R, u_ra_valid_vals), type, b);
+    walk_sd_def(img, rec + offsetof(R, u_ra_sd), b);
+    swap_value(img, rec + value_field, own_value_type(img, rec + offsetof(R, u_ra_sd), type), b.sbase);
+    return type;
+}
+
 void swap_pattr(const swap_image &img, size_t first, uint32_t count, const swap_bases &b) {
     using R = rsrc_pattr_t;
     for_each_item(img, first, count, sizeof(R), [&](size_t rec) {
-        const zu_data_type_t type = load_type(img, rec + offsetof(R, ra_data_type));
-        walk_var_list(img, rec + offsetof(R, u_ra_variety_list), b);
-        walk_valid_vals(img, rec + offsetof(R, u_ra_valid_vals), type, b);
-        walk_sd_def(img, rec + offsetof(R, u_ra_sd), b);
-        swap_value(img, rec + offsetof(R, ra_dflt_value), own_value_type(img, rec + offsetof(R, u_ra_sd), type),
-                   b.sbase);
+        swap_attr_lists_and_value<R>(img, rec, offsetof(R, ra_dflt_value), b);
         swap_spots(img, rec,
                    {NUM(R, ra_data_type), NUM(R, ra_cb_ID), NUM(R, ra_props), REF(R, u_ra_name),
                     NUM(R, ra_dscr_msgid), NUM(R, ra_disp_msgid), NUM(R, ra_group_msgid), NUM(R, ra_group_id),
@@ -257,12 +265,7 @@ void swap_pattr(const swap_image &img, size_t first, uint32_t count, const swap_
 void swap_dattr(const swap_image &img, size_t first, uint32_t count, const swap_bases &b) {
     using R = rsrc_dattr_t;
     for_each_item(img, first, count, sizeof(R), [&](size_t rec) {
-        const zu_data_type_t type = load_type(img, rec + offsetof(R, ra_data_type));
-        walk_var_list(img, rec + offsetof(R, u_ra_variety_list), b);
-        walk_valid_vals(img, rec + offsetof(R, u_ra_valid_vals), type, b);
-        walk_sd_def(img, rec + offsetof(R, u_ra_sd), b);
-        swap_value(img, rec + offsetof(R, ra_init_value), own_value_type(img, rec + offsetof(R, u_ra_sd), type),
-                   b.sbase);
+        const zu_data_type_t type = swap_attr_lists_and_value<R>(img, rec, offsetof(R, ra_init_value), b);
         const zu_data_type_t rtype = range_type(img, rec, type);
         swap_value(img, rec + offsetof(R, ra_min_value), rtype, b.sbase);
         swap_value(img, rec + offsetof(R, ra_max_value), rtype, b.sbase);
