@@ -156,32 +156,28 @@ class_dsect walker::walk_class(const anchor &a, const std::string &path) {
     if (!walk_class_layout(a, path, t, tables)) return c;
     walk_class_fields(b, path, t, c);
 
-    auto records = [&](int table, size_t size) { return tables[table].len / size; };
+    // Walks the records of one table into out, through walk(record, path, item).
+    auto each = [&](int table, size_t size, const char *name, auto &out, auto walk) {
+        out.resize(tables[table].len / size);
+        for (size_t i = 0; i < out.size(); i++)
+            walk(tables[table].base + i * size, indexed(path, name, i), out[i]);
+    };
     std::vector<pending_range> pending;
-    c.pattrs_class.resize(records(T_PATTRS_C, sizeof(rsrc_pattr_t)));
-    for (size_t i = 0; i < c.pattrs_class.size(); i++)
-        walk_pattr(tables[T_PATTRS_C].base + i * sizeof(rsrc_pattr_t), indexed(path, "pattrsC", i), t,
-                   RSRC_PATTR_CLASS_ID, c.pattrs_class[i]);
-    c.dattrs_class.resize(records(T_DATTRS_C, sizeof(rsrc_dattr_t)));
-    for (size_t i = 0; i < c.dattrs_class.size(); i++)
-        walk_dattr(tables[T_DATTRS_C].base + i * sizeof(rsrc_dattr_t), indexed(path, "dattrsC", i), t,
-                   RSRC_DATTR_CLASS_ID, c.dattrs_class[i], pending);
-    c.pattrs.resize(records(T_PATTRS, sizeof(rsrc_pattr_t)));
-    for (size_t i = 0; i < c.pattrs.size(); i++)
-        walk_pattr(tables[T_PATTRS].base + i * sizeof(rsrc_pattr_t), indexed(path, "pattrs", i), t, RSRC_PATTR_RSRC_ID,
-                   c.pattrs[i]);
-    c.dattrs.resize(records(T_DATTRS, sizeof(rsrc_dattr_t)));
-    for (size_t i = 0; i < c.dattrs.size(); i++)
-        walk_dattr(tables[T_DATTRS].base + i * sizeof(rsrc_dattr_t), indexed(path, "dattrs", i), t, RSRC_DATTR_RSRC_ID,
-                   c.dattrs[i], pending);
-    c.actions_class.resize(records(T_ACTIONS_C, sizeof(rsrc_action_t)));
-    for (size_t i = 0; i < c.actions_class.size(); i++)
-        walk_action(tables[T_ACTIONS_C].base + i * sizeof(rsrc_action_t), indexed(path, "actionsC", i), t,
-                    RSRC_ACTION_CLASS_ID, c.actions_class[i]);
-    c.actions.resize(records(T_ACTIONS, sizeof(rsrc_action_t)));
-    for (size_t i = 0; i < c.actions.size(); i++)
-        walk_action(tables[T_ACTIONS].base + i * sizeof(rsrc_action_t), indexed(path, "actions", i), t,
-                    RSRC_ACTION_RSRC_ID, c.actions[i]);
+    auto pattrs = [&](uint32_t id) {
+        return [&, id](size_t r, const std::string &p, pattr &x) { walk_pattr(r, p, t, id, x); };
+    };
+    auto dattrs = [&](uint32_t id) {
+        return [&, id](size_t r, const std::string &p, dattr &x) { walk_dattr(r, p, t, id, x, pending); };
+    };
+    auto actions = [&](uint32_t id) {
+        return [&, id](size_t r, const std::string &p, action &x) { walk_action(r, p, t, id, x); };
+    };
+    each(T_PATTRS_C, sizeof(rsrc_pattr_t), "pattrsC", c.pattrs_class, pattrs(RSRC_PATTR_CLASS_ID));
+    each(T_DATTRS_C, sizeof(rsrc_dattr_t), "dattrsC", c.dattrs_class, dattrs(RSRC_DATTR_CLASS_ID));
+    each(T_PATTRS, sizeof(rsrc_pattr_t), "pattrs", c.pattrs, pattrs(RSRC_PATTR_RSRC_ID));
+    each(T_DATTRS, sizeof(rsrc_dattr_t), "dattrs", c.dattrs, dattrs(RSRC_DATTR_RSRC_ID));
+    each(T_ACTIONS_C, sizeof(rsrc_action_t), "actionsC", c.actions_class, actions(RSRC_ACTION_CLASS_ID));
+    each(T_ACTIONS, sizeof(rsrc_action_t), "actions", c.actions, actions(RSRC_ACTION_RSRC_ID));
     // Last, so that the bodies every other value designates are known.
     for (const pending_range &p : pending) decide_range(p, t);
     return c;
