@@ -6,14 +6,14 @@
 cdb_ref_t *qecfg_compiler::sd_owner_field(int table_id) {
     rsrc_class_t &c = cb_rsrc_class;
     rsrc_action_t &a = cb_rsrc_actionC.ac_cb_ID ? cb_rsrc_actionC : cb_rsrc_action;
-    switch (table_id) {
-    case ST_ONLINE_SD: return &c.u_rc_online_input;
-    case ST_OFFLINE_SD: return &c.u_rc_offline_input;
-    case ST_DEFINE_SD: return &c.u_rc_def_input;
-    case ST_UNDEFINE_SD: return &c.u_rc_undef_input;
-    case ST_RESET_SD: return &c.u_rc_reset_input;
-    case ST_ACTION_IN_SD: return &a.u_ac_sd_input;
-    case ST_ACTION_OUT_SD: return &a.u_ac_sd_resp;
+    switch (SD_stanza_type(table_id)) {
+    case SD_TYPE_ONLINE: return &c.u_rc_online_input;
+    case SD_TYPE_OFFLINE: return &c.u_rc_offline_input;
+    case SD_TYPE_DEFINE: return &c.u_rc_def_input;
+    case SD_TYPE_UNDEFINE: return &c.u_rc_undef_input;
+    case SD_TYPE_RESET: return &c.u_rc_reset_input;
+    case SD_TYPE_ACT_IN: return &a.u_ac_sd_input;
+    case SD_TYPE_ACT_RESP: return &a.u_ac_sd_resp;
     default: return curr_sd_tbl; // set by the attribute's DataType statement
     }
 }
@@ -55,7 +55,8 @@ void qecfg_compiler::start_sd_header(int table_id) {
 // their own definition, or that already have one.
 void qecfg_compiler::check_new_definition(int table_id) {
     bool attr_kind = is_attr_SD(table_id);
-    bool action_kind = table_id == ST_ACTION_IN_SD || table_id == ST_ACTION_OUT_SD;
+    sd_type_t kind = SD_stanza_type(table_id);
+    bool action_kind = kind == SD_TYPE_ACT_IN || kind == SD_TYPE_ACT_RESP;
     if (action_kind && !cb_rsrc_actionC.ac_cb_ID && !cb_rsrc_action.ac_cb_ID)
         statement_error("No action for this SD definition");
     bool attr_waiting = attr_dflt_val && curr_sd_tbl && load<uint32_t>(curr_sd_tbl) == CDB_NONE;
