@@ -59,6 +59,16 @@ class Place : public ::testing::Test {
     string field_bytes() const { return string(reinterpret_cast<const char *>(field), 8); }
     // The field with its first bytes replaced.
     static string field_with(const string &first) { return first + string(8 - first.size(), '\xA5'); }
+    // The range codes give the none marker and append no body.
+    void expect_range_ends_are_none(zu_data_type_t t) {
+        size_t used = tbl_used(st);
+        for (int code : {R_LO_DEFAULT, R_HI_DEFAULT}) {
+            SetUp();
+            ASSERT_EQ(place(nullptr, t, code), 0);
+            EXPECT_EQ(field_bytes(), bytes{}.ff(8).b);
+        }
+        EXPECT_EQ(tbl_used(st), used);
+    }
     uint32_t u32_at(uint32_t off) const { return load<uint32_t>(st->tbl_base + off); }
     int place(const zu_value_t *in, zu_data_type_t t, int code, anchor *an = nullptr, uint32_t cnt = 1) {
         return c.copy_this_type(value_slot::at(field), in, t, code, st, an, cnt);
@@ -181,12 +191,7 @@ TEST_F(Place, DefaultTextIsEightZerosAndRangeTextIsNone) {
         EXPECT_EQ(field_bytes(), field_with(bits(at)));
     }
     EXPECT_EQ(table(), bytes{}.zeros(16).b); // each default a body of its own
-    for (int code : {R_LO_DEFAULT, R_HI_DEFAULT}) {
-        SetUp();
-        ASSERT_EQ(place(nullptr, ZU_CHAR_PTR, code), 0);
-        EXPECT_EQ(field_bytes(), bytes{}.ff(8).b);
-    }
-    EXPECT_EQ(tbl_used(st), 16u);
+    expect_range_ends_are_none(ZU_CHAR_PTR);
 }
 
 // ----------------------------------------------------------------- binaries
@@ -216,12 +221,7 @@ TEST_F(Place, DefaultBinaryIsALengthWordOnly) {
     ASSERT_EQ(place(nullptr, ZU_BINARY_PTR, INIT_DEFAULT), 0);
     EXPECT_EQ(field_bytes(), field_with(bits<uint32_t>(8)));
     EXPECT_EQ(table(), bytes{}.zeros(16).b);
-    for (int code : {R_LO_DEFAULT, R_HI_DEFAULT}) {
-        SetUp();
-        ASSERT_EQ(place(nullptr, ZU_BINARY_PTR, code), 0);
-        EXPECT_EQ(field_bytes(), bytes{}.ff(8).b);
-    }
-    EXPECT_EQ(tbl_used(st), 16u);
+    expect_range_ends_are_none(ZU_BINARY_PTR);
 }
 
 // --------------------------------------------------------- resource handles

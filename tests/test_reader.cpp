@@ -14,28 +14,36 @@ std::string class_string(const std::string &cdb, size_t ref_field) {
     return std::string(cdb.c_str() + strings + u32_at(cdb, CLASS + ref_field));
 }
 
+// The class name stored when the class's Name statement line reads `line`.
+std::string class_name_with(const std::string &line) {
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("    Name=Test.Class\n"), 20, line + "\n");
+    compile_result r = compile_text(src);
+    EXPECT_EQ(r.message, "");
+    return r.has_output ? class_string(r.cdb, 8) : "";
+}
+
 TEST(Reader, CommentAndBlankLinesAreIgnored) {
     compile_result r = compile_text("  # note\n// note\n/* note\n\t\n  \"\"  \"\n" + BASE_SOURCE + "   /* trailing\n");
     EXPECT_EQ(r.message, "");
     EXPECT_TRUE(r.has_output);
 }
 
-TEST(Reader, CommentAfterValueIsCutAndTrailingBlanksRemoved) {
+TEST(Reader, CommentAfterANumberIsCut) {
     std::string src = BASE_SOURCE;
     src.replace(src.find("Description=1"), 13, "Description=12 # twelve");
-    src.replace(src.find("Name=Test.Class"), 15, "Name=\"a#b\"   ");
     compile_result r = compile_text(src);
     ASSERT_EQ(r.message, "");
     EXPECT_EQ(u16_at(r.cdb, CLASS + 210), 12);
-    EXPECT_EQ(class_string(r.cdb, 8), "a#b");
 }
 
-TEST(Reader, SlashCommentsOutsideQuotesOnly) {
-    std::string src = BASE_SOURCE;
-    src.replace(src.find("Name=Test.Class"), 15, "Name=\"x//y\" // the name");
-    compile_result r = compile_text(src);
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(class_string(r.cdb, 8), "x//y");
+TEST(Reader, CommentsAndQuotesInTheValue) {
+    EXPECT_EQ(class_name_with("    Name=\"a#b\"   "), "a#b");            // '#' inside quotes, blanks stripped
+    EXPECT_EQ(class_name_with("    Name=ab # the name"), "ab");           // comment after the value
+    EXPECT_EQ(class_name_with("    Name=\"x//y\" // the name"), "x//y"); // '//' inside quotes
+    EXPECT_EQ(class_name_with("    Name=x/y /* z"), "x/y");              // '/*' needs no '*/'
+    EXPECT_EQ(class_name_with("    Name=Test.Class\r"), "Test.Class\r"); // a carriage return is text
+    EXPECT_EQ(class_name_with(std::string("    Name=Te\0st", 14)), "Te"); // a NUL ends the line
 }
 
 TEST(Reader, HeaderFollowedByCommentIsRecognised) {
@@ -65,25 +73,9 @@ TEST(Reader, NewlineAfterTwoHundredFiftyFourCharactersIsAPieceOfItsOwn) {
     EXPECT_EQ(with_name_line(254), "17: Invalid table name: Bogus\n");
 }
 
-TEST(Reader, CarriageReturnStaysInTheValue) {
-    std::string src = BASE_SOURCE;
-    src.replace(src.find("Name=Test.Class\n"), 16, "Name=Test.Class\r\n");
-    compile_result r = compile_text(src);
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(class_string(r.cdb, 8), "Test.Class\r");
-}
-
 TEST(Reader, UnterminatedLastLineIsRead) {
     std::string src = BASE_SOURCE.substr(0, BASE_SOURCE.size() - 1);
     EXPECT_EQ(compile_text(src + "\nBogus").message, "16: Invalid table name: Bogus\n");
-}
-
-TEST(Reader, NulByteEndsTheLine) {
-    std::string src = BASE_SOURCE;
-    src.replace(src.find("Name=Test.Class"), 15, std::string("Name=Te\0st", 10));
-    compile_result r = compile_text(src);
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(class_string(r.cdb, 8), "Te");
 }
 
 TEST(Driver, OptionalStatementsAddNoMaskTrace) {
