@@ -305,13 +305,21 @@ annotation walker::take_annotation() {
 // ---------------------------------------------------------------------------
 // Manager, map and variable class
 
+// The record that opens a dsect: long enough, with its identifier word.
+bool walker::dsect_record(const anchor &a, size_t size, uint32_t id, const char *kind, const std::string &path,
+                          const char *id_field) {
+    if (!check(a.length >= size, a.offset,
+               path + ": a " + kind + " dsect of " + std::to_string(a.length) + " bytes is shorter than its record"))
+        return false;
+    expect_id(a.offset, id, path + "." + id_field);
+    return true;
+}
+
 mgr_dsect walker::walk_manager(const anchor &a, const std::string &path) {
     mgr_dsect m;
     size_t b = a.offset;
-    if (!check(a.length >= sizeof(rsrc_mgr_t), b,
-               path + ": a manager dsect of " + std::to_string(a.length) + " bytes is shorter than its record"))
+    if (!dsect_record(a, sizeof(rsrc_mgr_t), RSRC_MGR_ID, "manager", path, "rm_cb_ID"))
         return m;
-    expect_id(b, RSRC_MGR_ID, path + ".rm_cb_ID");
     m.id = uint16_t(num(b + offsetof(rsrc_mgr_t, rm_id), 2, path + ".rm_id"));
     num(b + offsetof(rsrc_mgr_t, rm_spare), 2, path + ".rm_spare");
     region strings{b + sizeof(rsrc_mgr_t), a.length - sizeof(rsrc_mgr_t), "ManagerStrings"};
@@ -327,10 +335,8 @@ mgr_dsect walker::walk_manager(const anchor &a, const std::string &path) {
 map_dsect walker::walk_map(const anchor &a, const std::string &path) {
     map_dsect m;
     size_t b = a.offset;
-    if (!check(a.length >= sizeof(rsrc_cmmap_t), b,
-               path + ": a map dsect of " + std::to_string(a.length) + " bytes is shorter than its record"))
+    if (!dsect_record(a, sizeof(rsrc_cmmap_t), RSRC_CMMAP_ID, "map", path, "rcm_cb_ID"))
         return m;
-    expect_id(b, RSRC_CMMAP_ID, path + ".rcm_cb_ID");
     m.class_id = uint16_t(num(b + offsetof(rsrc_cmmap_t, rcm_class_ID), 2, path + ".rcm_class_ID"));
     m.rm_id = uint16_t(num(b + offsetof(rsrc_cmmap_t, rcm_rm_ID), 2, path + ".rcm_rm_ID"));
     region strings{b + sizeof(rsrc_cmmap_t), a.length - sizeof(rsrc_cmmap_t), "CMMapStrings"};
@@ -360,10 +366,8 @@ var_class_dsect walker::walk_var_class(const anchor &a, const std::string &path)
     var_class_dsect v;
     size_t b = a.offset;
     const size_t rec = sizeof(rsrc_variable_class_t);
-    if (!check(a.length >= rec, b,
-               path + ": a variable-class dsect of " + std::to_string(a.length) + " bytes is shorter than its record"))
+    if (!dsect_record(a, rec, RSRC_VARIABLE_CLASS_ID, "variable-class", path, "rvc_cb_ID"))
         return v;
-    expect_id(b, RSRC_VARIABLE_CLASS_ID, path + ".rvc_cb_ID");
     v.obsv_interval =
         uint16_t(num(b + offsetof(rsrc_variable_class_t, rvc_obsv_interval), 2, path + ".rvc_obsv_interval"));
     v.report_interval =

@@ -146,10 +146,8 @@ void walker::walk_class_fields(size_t b, const std::string &path, const class_ta
 class_dsect walker::walk_class(const anchor &a, const std::string &path) {
     class_dsect c;
     size_t b = a.offset;
-    if (!check(a.length >= sizeof(rsrc_class_t), b,
-               path + ": a class dsect of " + std::to_string(a.length) + " bytes is shorter than its record"))
+    if (!dsect_record(a, sizeof(rsrc_class_t), RSRC_CLASS_ID, "class", path, "rc_cb_ID"))
         return c;
-    expect_id(b, RSRC_CLASS_ID, path + ".rc_cb_ID");
     class_tables t;
     region tables[NUM_TABLES];
     walk_empty_tables(b, path);

@@ -50,6 +50,8 @@ class walker {
     void emit(size_t off, size_t len, std::string field, std::string value);
     uint64_t num(size_t off, unsigned width, const std::string &field);
     bool expect_id(size_t off, uint32_t id, const std::string &field);
+    bool dsect_record(const anchor &a, size_t size, uint32_t id, const char *kind, const std::string &path,
+                      const char *id_field);
     uint32_t ref(size_t off, const std::string &field);
     bool fits(const region &r, uint64_t off, uint64_t len) const { return off <= r.len && len <= r.len - off; }
     bool claimed(size_t off, size_t len) const;
