@@ -35,7 +35,7 @@ std::string var_type_name(uint32_t vt);
 // "class", "manager", "map", "variable_class", or "type N".
 std::string dsect_kind_name(uint32_t type);
 
-inline bool is_array_type(uint32_t dt) { return dt >= 13 && dt <= 22; }
+inline bool is_array_type(uint32_t dt) { return zu_is_array_type(dt); }
 inline uint32_t element_type(uint32_t dt) { return is_array_type(dt) ? dt - 11 : dt; }
 inline bool is_numeric_type(uint32_t dt) { return dt >= 2 && dt <= 7; }
 inline bool is_wide_type(uint32_t dt) { return dt == 4 || dt == 5 || dt == 7; }
