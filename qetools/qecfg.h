@@ -376,8 +376,8 @@ class qecfg_compiler {
     void begin_dsect(cdb_dsect_type_t type);
     char *copy_record(cdb_dsect_type_t type, const char *src, size_t size);
     void grow_dsect(size_t len);
-    void copy_table(char *rec, size_t ref_field, const tbl *t, bool rounded);
-    void release_storage(const tbl *t);
+    void copy_table(char *rec, size_t ref_field, tbl *t, bool rounded);
+    void release_storage(tbl *t);
     void note_numeric_ranges(const tbl *t);
     void add_rsrc_class_tbls();
     void add_rsrc_mgr_tbls();

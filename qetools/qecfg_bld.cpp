@@ -242,7 +242,7 @@ char *qecfg_compiler::copy_record(cdb_dsect_type_t type, const char *src, size_t
 }
 
 // Copies a table behind the record and points the record's reference at it.
-void qecfg_compiler::copy_table(char *rec, size_t ref_field, const tbl *t, bool rounded) {
+void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounded) {
     cdb_ref_t ref{};
     ref.offset[0] = uint32_t(dsp - rec);
     std::memcpy(rec + ref_field, &ref, sizeof ref);
@@ -257,13 +257,11 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, const tbl *t, bool 
 
 // Once its bytes are in the image a table's storage is given back, so that
 // the tables and the image are not both held in memory in full.
-void qecfg_compiler::release_storage(const tbl *t) {
-    tbl *owned = const_cast<tbl *>(t);
-    if (!owned || !owned->tbl_base)
+void qecfg_compiler::release_storage(tbl *t) {
+    if (!t || !t->tbl_base)
         return;
-    std::free(owned->tbl_base);
-    owned->tbl_base = owned->tbl_prev_base = owned->tbl_next = owned->tbl_end = nullptr;
-    owned->tbl_size = owned->tbl_cap = 0;
+    std::free(t->tbl_base);
+    *t = tbl{nullptr, nullptr, nullptr, 0, nullptr, t->tbl_au, t->tbl_name, 0};
 }
 
 void qecfg_compiler::add_rsrc_class_tbls() {
@@ -281,7 +279,7 @@ void qecfg_compiler::add_rsrc_class_tbls() {
         const char *src = rsrc_class_tbl.tbl_base + i * sizeof(rsrc_class_t);
         char *rec = copy_record(CDB_DSECT_CLASS, src, sizeof(rsrc_class_t));
         for (size_t field : copied) {
-            const tbl *t = ref_tbl(src, field);
+            tbl *t = ref_tbl(src, field);
             if (field == offsetof(rsrc_class_t, u_rc_dattrsC) || field == offsetof(rsrc_class_t, u_rc_dattrs))
                 note_numeric_ranges(t);
             copy_table(rec, field, t, false);
@@ -343,7 +341,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
     for (size_t i = 0; i < n; i++) {
         const char *src = rsrc_var_class_tbl.tbl_base + i * sizeof(rsrc_variable_class_t);
         char *rec = copy_record(CDB_DSECT_VAR_CLASS, src, sizeof(rsrc_variable_class_t));
-        const tbl *strings = ref_tbl(src, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
+        tbl *strings = ref_tbl(src, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
         size_t len = tbl_used(strings);
         memcpy_8_rounded(dsp, strings ? strings->tbl_base : nullptr, len);
         grow_dsect(round8(len));
@@ -352,7 +350,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         cdb_ref_t ref{};
         ref.offset[0] = uint32_t(round8(len));
         std::memcpy(rec + offsetof(rsrc_variable_class_t, u_rvc_string_tbl), &ref, sizeof ref);
-        if (const tbl *ids = find_tbl_entry(src)) {
+        if (tbl *ids = find_tbl_entry(src)) {
             memcpy_8_rounded(dsp, ids->tbl_base, tbl_used(ids));
             grow_dsect(round8(tbl_used(ids)));
             release_storage(ids);

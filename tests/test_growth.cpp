@@ -57,4 +57,22 @@ TEST(Growth, EveryClassTableGrowsPastItsUnit) {
     EXPECT_STREQ(b.c_str() + strings + u32_at(b, array + 16), "second");
 }
 
+std::string class_attributes(int n) {
+    std::string s = BASE_SOURCE;
+    for (int i = 0; i < n; i++)
+        s += "PersistentClassAttribute\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=1\n"
+             "    DataType=Int32\n    VarietyRange=1,1\n";
+    return s;
+}
+
+TEST(Growth, ACountHoldsAtMost65535Records) {
+    compile_result full = compile_text(class_attributes(65535));
+    ASSERT_EQ(full.message, "");
+    EXPECT_EQ(u16_at(full.cdb, 128 + 168), 65535);
+    compile_result over = compile_text(class_attributes(65536));
+    EXPECT_EQ(over.message, "Too many records in table: ClassPattrsC\n");
+    EXPECT_EQ(over.code, 1);
+    EXPECT_FALSE(over.has_output);
+}
+
 } // namespace
