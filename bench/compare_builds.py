@@ -216,9 +216,9 @@ def compare(args, item, scratch):
         b = run_one(args.new, os.path.join(scratch, "b"), src, mode)
         if a != b:
             what = [k for k, x, y in zip(("status", "stdout", "stderr", "output"), a, b) if x != y]
-            diffs.append("%s %s: %s differ%s" % (name, " ".join(mode) or "plain", ", ".join(what),
-                                                 "" if "output" in what else
-                                                 " (%r / %r)" % (a[2][-200:], b[2][-200:])))
+            detail = "" if "output" in what else " (%r / %r)" % (a[2][-120:].split(b": ", 1)[-1],
+                                                               b[2][-120:].split(b": ", 1)[-1])
+            diffs.append("%s %s: %s differ%s" % (name, " ".join(mode) or "plain", ", ".join(what), detail))
     return diffs, a[0] == 0
 
 
@@ -249,7 +249,13 @@ def main():
         shutil.rmtree(scratch, ignore_errors=True)
     print("sources: %d (compiled: %d, refused: %d), runs per binary: %d, differing runs: %d"
           % (len(items), compiled, len(items) - compiled, len(items) * len(MODES), len(differing)))
-    for d in differing[:40]:
+    kinds = {}
+    for d in differing:
+        kind = d.split(": ", 1)[1]
+        kinds[kind] = kinds.get(kind, 0) + 1
+    for kind, n in sorted(kinds.items(), key=lambda k: -k[1]):
+        print("%6d x %s" % (n, kind))
+    for d in differing[:20]:
         print(d)
     return 1 if differing else 0
 

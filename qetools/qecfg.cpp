@@ -71,7 +71,7 @@ void qecfg_compiler::bind_sc_tables() {
     sc_tables[NUM_STANZA_TYPES] = srtable_ctrl{};
 }
 
-void qecfg_compiler::qecfg_error_exit_rtn(const char *msg, const char *v1, const char *v2, int line, int code) {
+void qecfg_compiler::qecfg_error_exit_rtn(const char *msg, const char *v1, const char *v2, uint64_t line, int code) {
     if (cdb_fp) {
         std::fclose(cdb_fp);
         cdb_fp = nullptr;

@@ -209,7 +209,7 @@ class qecfg_compiler {
     void run();
 
     // --- error exits
-    [[noreturn]] void qecfg_error_exit_rtn(const char *msg, const char *v1, const char *v2, int line, int code);
+    [[noreturn]] void qecfg_error_exit_rtn(const char *msg, const char *v1, const char *v2, uint64_t line, int code);
     [[noreturn]] void bld_error_exit(const char *msg, const char *v1, const char *v2, int code);
 
     // --- growable tables
@@ -289,7 +289,7 @@ class qecfg_compiler {
     // --- state, public so that tests can look at a compile
     qecfg_options opt;
     srtable_ctrl sc_tables[NUM_STANZA_TYPES + 1];
-    int linenum = 0;
+    uint64_t linenum = 0; // pieces of input read; more than 2^31 is possible
     FILE *cdb_fp = nullptr;
     std::string rm_name;
     bool rm_name_given = false;

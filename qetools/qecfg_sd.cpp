@@ -21,8 +21,11 @@ cdb_ref_t *qecfg_compiler::sd_owner_field(int table_id) {
 void qecfg_compiler::start_sd_header(int table_id) {
     srtable_ctrl *scp = &sc_tables[table_id];
     bool attr_kind = is_attr_SD(table_id);
+    // Without a class there is no structured attribute either: an attribute
+    // run is refused for its missing owner, as after a ResourceClass.
     if (!cb_rsrc_class.rc_cb_ID)
-        statement_error("No class for SD Definition");
+        statement_error(attr_kind ? "Incorrect attribute type preceding this SD definition"
+                                  : "No class for SD Definition");
     bool completed = false;
     if (prev_scp && std::strcmp(prev_scp->sc_name, scp->sc_name) != 0 && cb_sd_def.sd_cb_ID) {
         cmplt_sd_tbl(prev_scp);
