@@ -160,6 +160,6 @@ inline constexpr const char *zuTypeStr[ZU_NUM_DATA_TYPES] = {
     "Float64Array", "StringArray", "BinaryArray", "RHArray",      "SDArray",
 };
 
-inline bool zu_is_array_type(uint32_t dt) { return dt >= ZU_INT32_ARRAY && dt <= ZU_SD_PTR_ARRAY; }
+constexpr bool zu_is_array_type(uint32_t dt) { return dt >= ZU_INT32_ARRAY && dt <= ZU_SD_PTR_ARRAY; }
 
 #endif

@@ -1,80 +1,24 @@
-// One compile: binding of the keyword table to this compile's control blocks,
-// the compile sequence after the source has been read, and the error exits.
+// One compile: the sequence after the source has been read, the order in
+// which open records are completed, and the fatal exit.
 #include <cerrno>
 #include <cstdlib>
 #include <new>
 
 #include "qecfg.h"
 
-qecfg_compiler::qecfg_compiler(qecfg_options opts) : opt(std::move(opts)) { bind_sc_tables(); }
-
-qecfg_compiler::~qecfg_compiler() {
-    release_output(false);
-    if (cdb_fp)
-        std::fclose(cdb_fp);
-    for (tbl *t : {&rsrc_class_tbl, &rsrc_cmmap_tbl, &rsrc_mgr_tbl, &rsrc_var_class_tbl})
-        std::free(t->tbl_base);
+qecfg_context::~qecfg_context() {
+    if (source_fp)
+        std::fclose(source_fp);
     for (tbl *t : owned_tbls)
         std::free(t->tbl_base);
     for (void *p : owned_blocks)
         std::free(p);
 }
 
-void qecfg_compiler::bind_sc_tables() {
-    rsrc_class_t &c = cb_rsrc_class;
-    for (int i = 0; i < NUM_STANZA_TYPES; i++) {
-        const stanza_def &d = stanza_defs[i];
-        srtable_ctrl &e = sc_tables[i];
-        e = srtable_ctrl{d.name, nullptr, d.num_attrs, nullptr, &c.u_rc_strings, &c.u_rc_variety_lists,
-                         &c.u_rc_valid_vals, &c.u_rc_sd_defs, 0, d.req_mask_cmplt, 0, dflt_tbl{}, 0, d.attrs};
-        for (int r = 0; r < d.num_attrs; r++)
-            attr_name_len[i][r] = std::strlen(d.attrs[r].ta_name);
-        if (is_SD_stanza(i)) {
-            e.sc_cb = &cb_sd_def;
-            e.sc_init_tbl = &qecfg_compiler::init_sd_tbl;
-        }
-    }
-    struct binding {
-        stanza_idx i;
-        void *cb;
-        init_rtn_t init;
-        int dt_offset;
-    };
-    const binding bindings[] = {
-        {ST_CONTROL_DEFINITION, &cb_rsrc_class, &qecfg_compiler::init_class_tbl, 0},
-        {ST_CLASS_TO_MANAGER_MAPPING, &cb_rsrc_cmmap, &qecfg_compiler::init_cmmap_tbl, 0},
-        {ST_RESOURCE_VARIABLE_CLASS, &cb_rsrc_variable_class, &qecfg_compiler::init_var_class_tbl, 0},
-        {ST_RESOURCE_CLASS, &cb_rsrc_class, &qecfg_compiler::init_class_tbl_fake, 0},
-        {ST_PERSISTENT_RESOURCE_ATTRIBUTE, &cb_rsrc_pattr, &qecfg_compiler::init_pattr_tbl,
-         int(offsetof(rsrc_pattr_t, ra_data_type))},
-        {ST_PERSISTENT_CLASS_ATTRIBUTE, &cb_rsrc_pattrC, &qecfg_compiler::init_pattrC_tbl,
-         int(offsetof(rsrc_pattr_t, ra_data_type))},
-        {ST_DYNAMIC_RESOURCE_ATTRIBUTE, &cb_rsrc_dattr, &qecfg_compiler::init_dattr_tbl,
-         int(offsetof(rsrc_dattr_t, ra_data_type))},
-        {ST_DYNAMIC_CLASS_ATTRIBUTE, &cb_rsrc_dattrC, &qecfg_compiler::init_dattrC_tbl,
-         int(offsetof(rsrc_dattr_t, ra_data_type))},
-        {ST_CLASS_ACTION, &cb_rsrc_actionC, &qecfg_compiler::init_actionC_tbl, 0},
-        {ST_RESOURCE_ACTION, &cb_rsrc_action, &qecfg_compiler::init_action_tbl, 0},
-    };
-    for (const binding &b : bindings) {
-        sc_tables[b.i].sc_cb = b.cb;
-        sc_tables[b.i].sc_init_tbl = b.init;
-        sc_tables[b.i].dt_offset = b.dt_offset;
-    }
-    // The map and the variable classes keep strings of their own.
-    srtable_ctrl &map = sc_tables[ST_CLASS_TO_MANAGER_MAPPING];
-    map.sc_str_tbl = &cb_rsrc_cmmap.u_rcm_strings;
-    map.sc_vty_tbl = map.sc_vv_tbl = map.sc_sd_tbl = nullptr;
-    srtable_ctrl &rvc = sc_tables[ST_RESOURCE_VARIABLE_CLASS];
-    rvc.sc_str_tbl = &cb_rsrc_variable_class.u_rvc_string_tbl;
-    rvc.sc_vty_tbl = rvc.sc_vv_tbl = nullptr;
-    sc_tables[NUM_STANZA_TYPES] = srtable_ctrl{};
-}
-
-void qecfg_compiler::qecfg_error_exit_rtn(const char *msg, const char *v1, const char *v2, uint64_t line, int code) {
-    if (cdb_fp) {
-        std::fclose(cdb_fp);
-        cdb_fp = nullptr;
+void qecfg_context::raise_fatal(const char *msg, const char *v1, const char *v2, uint64_t line, int code) {
+    if (source_fp) {
+        std::fclose(source_fp);
+        source_fp = nullptr;
     }
     std::string text;
     if (msg) {
@@ -83,42 +27,77 @@ void qecfg_compiler::qecfg_error_exit_rtn(const char *msg, const char *v1, const
         text += msg;
         text += v1 ? v1 : "";
         text += v2 ? v2 : "";
-        if (opt.interactive)
+        if (opt.newline_after_message)
             text += "\n";
     }
     throw qecfg_fatal{text, code};
 }
 
-void qecfg_compiler::statement_error(const char *msg, const char *v1, const char *v2) {
-    qecfg_error_exit_rtn(msg, v1, v2, linenum, 1);
+void qecfg_context::statement_error(const char *msg, const char *v1, const char *v2) {
+    raise_fatal(msg, v1, v2, linenum, 1);
 }
 
+qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {
+    for (int i = 0; i < NUM_STANZA_TYPES; i++)
+        for (int r = 0; r < stanza_defs[i].num_rows; r++)
+            row_name_len[i][r] = std::strlen(stanza_defs[i].rows[r].name);
+}
+
+qecfg_compiler::~qecfg_compiler() {
+    release_output(false);
+    for (record_table *r : {&classes, &maps, &managers, &var_classes})
+        std::free(r->t.tbl_base);
+    // The lists of the builders are tables of their own.
+    for (attr_builder &a : attrs)
+        a.release_lists();
+}
+
+// Everything still open at the end of the source. Each completion appends
+// bodies to "ClassStrings", so this order decides the string layout: the
+// structured-data run first (it writes into its attribute's record), then the
+// attributes and the actions of the last class.
 void qecfg_compiler::finish_open_records() {
-    if (cb_sd_def.sd_cb_ID)
-        cmplt_sd_tbl(curr_sd_scp);
-    if (cb_rsrc_pattr.ra_cb_ID)
-        cmplt_pattr_tbl();
-    if (cb_rsrc_dattr.ra_cb_ID)
-        cmplt_dattr_tbl();
-    if (cb_rsrc_pattrC.ra_cb_ID)
-        cmplt_pattrC_tbl();
-    if (cb_rsrc_dattrC.ra_cb_ID)
-        cmplt_dattrC_tbl();
-    if (cb_rsrc_action.ac_cb_ID)
-        cmplt_action_tbl();
-    if (cb_rsrc_actionC.ac_cb_ID)
-        cmplt_actionC_tbl();
+    if (sd.pending())
+        sd.complete();
+    for (int k : {ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE, ST_PERSISTENT_CLASS_ATTRIBUTE,
+                  ST_DYNAMIC_CLASS_ATTRIBUTE}) {
+        attr_builder &a = attrs[k - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+        if (a.open())
+            a.complete();
+    }
+    for (action_builder *a : {&actions[1], &actions[0]})
+        if (a->open())
+            a->complete();
 }
 
+// A class completed at the next ControlDefinition takes its name first and
+// completes its attributes in an order of its own (class attributes first),
+// which decides the string layout of such a class as finish_open_records
+// decides that of the last one. The actions are already complete: every
+// header completes them.
+void qecfg_compiler::complete_class() {
+    if (cls.rec.u_rc_name.offset[0] == CDB_NONE)
+        cls.name_from_output();
+    for (int k : {ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE, ST_PERSISTENT_RESOURCE_ATTRIBUTE,
+                  ST_DYNAMIC_RESOURCE_ATTRIBUTE}) {
+        attr_builder &a = attrs[k - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+        if (a.open())
+            a.complete();
+    }
+    cls.finish();
+}
+
+// The map's ResourceManager statement is the only source of the manager.
 void qecfg_compiler::build_manager() {
-    // The map's ResourceManager statement is the only source of the name.
-    if (!rm_name_given)
-        qecfg_error_exit_rtn("No ResourceManager defined for the class-to-manager map", nullptr, nullptr, 0, 1);
-    init_mgr_tbl();
-    tbl *strings = static_cast<tbl *>(cb_rsrc_mgr.u_rm_strings_table.ptr);
-    cb_rsrc_mgr.u_rm_RMname = cdb_ref_t{};
-    cb_rsrc_mgr.u_rm_RMname.offset[0] = add_to_tbl(strings, rm_name.c_str(), rm_name.size() + 1);
-    cmplt_mgr_tbl();
+    if (!map.manager_given)
+        raise_fatal("No ResourceManager defined for the class-to-manager map", nullptr, nullptr, 0, 1);
+    rsrc_mgr_t m{};
+    m.rm_cb_ID = RSRC_MGR_ID;
+    tbl *strings = new_tbl("ManagerStrings", 8192);
+    m.u_rm_strings_table = table_ref(strings);
+    m.u_rm_RMname.offset[0] = add_to_tbl(strings, map.manager.c_str(), map.manager.size() + 1);
+    m.rm_id = qel_rm_id_t(managers.count);
+    managers.append(*this, m);
 }
 
 void qecfg_compiler::run() {
@@ -127,21 +106,21 @@ void qecfg_compiler::run() {
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
         release_output(true);
-        qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
+        raise_fatal("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
     }
 }
 
 void qecfg_compiler::compile() {
-    cache_input_data(opt.cdefsrc.c_str());
+    read_source(opt.cdefsrc.c_str());
     finish_open_records();
-    if (!cb_rsrc_class.rc_cb_ID)
-        qecfg_error_exit_rtn("No classes defined", nullptr, nullptr, 0, 1);
-    cmplt_class_tbl();
-    if (cb_rsrc_variable_class.rvc_cb_ID)
-        cmplt_var_class_tbl();
-    if (!cb_rsrc_cmmap.rcm_cb_ID)
-        qecfg_error_exit_rtn("No class-to-manager maps defined", nullptr, nullptr, 0, 1);
-    cmplt_cmmap_tbl();
+    if (!cls.open())
+        raise_fatal("No classes defined", nullptr, nullptr, 0, 1);
+    complete_class();
+    if (vclass.open())
+        vclass.complete();
+    if (!map.open())
+        raise_fatal("No class-to-manager maps defined", nullptr, nullptr, 0, 1);
+    map.complete();
     build_manager();
     bld_var_id_tbls();
     bld_cdb();

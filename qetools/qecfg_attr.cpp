@@ -1,203 +1,263 @@
 // Attribute stanzas: persistent and dynamic attributes, of a resource or of
-// the class; their completion supplies every value the source left out.
-#include "qecfg.h"
+// the class; their statements, and their completion, which supplies every
+// value the source left out.
+#include "qecfg_builders.h"
 
 namespace {
 
 struct attr_kind {
-    stanza_idx stanza;
     uint32_t id;
     cdb_ref_t rsrc_class_t::*table;
     const char *no_class_msg;
-    const char *no_table_msg;
-    bool dynamic;
 };
 
+// By stanza type, from PersistentResourceAttribute on.
 const attr_kind attr_kinds[] = {
-    {ST_PERSISTENT_RESOURCE_ATTRIBUTE, RSRC_PATTR_RSRC_ID, &rsrc_class_t::u_rc_pattrs,
-     "No class for PersistentAttribute", "PersistentResourceAttribute table not found", false},
-    {ST_PERSISTENT_CLASS_ATTRIBUTE, RSRC_PATTR_CLASS_ID, &rsrc_class_t::u_rc_pattrsC, "No class for pattr",
-     "PersistentClassAttribute table not found", false},
-    {ST_DYNAMIC_RESOURCE_ATTRIBUTE, RSRC_DATTR_RSRC_ID, &rsrc_class_t::u_rc_dattrs, "No class for DynamicAttribute",
-     "DynamicResourceAttribute table not found", true},
-    {ST_DYNAMIC_CLASS_ATTRIBUTE, RSRC_DATTR_CLASS_ID, &rsrc_class_t::u_rc_dattrsC, "No class for DynamicAttribute",
-     "DynamicClassAttribute table not found", true},
+    {RSRC_PATTR_RSRC_ID, &rsrc_class_t::u_rc_pattrs, "No class for PersistentAttribute"},
+    {RSRC_PATTR_CLASS_ID, &rsrc_class_t::u_rc_pattrsC, "No class for pattr"},
+    {RSRC_DATTR_RSRC_ID, &rsrc_class_t::u_rc_dattrs, "No class for DynamicAttribute"},
+    {RSRC_DATTR_CLASS_ID, &rsrc_class_t::u_rc_dattrsC, "No class for DynamicAttribute"},
 };
 
-constexpr uint32_t PA_REQD_FOR_DEFINE = 0x2;
-constexpr uint32_t PA_OPT_FOR_DEFINE = 0x8;
-constexpr uint32_t PA_INVAL_FOR_DEFINE = 0x4;
-constexpr uint32_t GROUP_ID_BIT = 0x80000001;
-constexpr uint16_t DEFAULT_GROUP_ID = 255;
+const attr_kind &kind_of(int stanza) { return attr_kinds[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE]; }
 
-bool is_numeric_array(zu_data_type_t dt) { return dt >= ZU_INT32_ARRAY && dt <= ZU_FLOAT64_ARRAY; }
-
-void set_none(char *field) {
-    std::memset(field, 0, sizeof(cdb_ref_t));
-    store<uint32_t>(field, CDB_NONE);
+// Types whose range is none: their values are not ordered.
+bool is_unranged_type(zu_data_type_t dt) {
+    switch (dt) {
+    case ZU_SD_PTR:
+    case ZU_SD_PTR_ARRAY:
+    case ZU_CHAR_PTR:
+    case ZU_CHAR_PTR_ARRAY:
+    case ZU_BINARY_PTR:
+    case ZU_BINARY_PTR_ARRAY:
+    case ZU_RSRC_HANDLE_PTR:
+    case ZU_RSRC_HANDLE_PTR_ARRAY: return true;
+    default: return false;
+    }
 }
+
+void set_none(char *field) { store(field, none_ref()); }
 
 } // namespace
 
-char *qecfg_compiler::attr_cb(int kind) {
-    switch (kind) {
-    case ST_PERSISTENT_RESOURCE_ATTRIBUTE: return reinterpret_cast<char *>(&cb_rsrc_pattr);
-    case ST_PERSISTENT_CLASS_ATTRIBUTE: return reinterpret_cast<char *>(&cb_rsrc_pattrC);
-    case ST_DYNAMIC_RESOURCE_ATTRIBUTE: return reinterpret_cast<char *>(&cb_rsrc_dattr);
-    default: return reinterpret_cast<char *>(&cb_rsrc_dattrC);
-    }
+attr_builder::attr_builder(qecfg_context &c, class_builder &owner, int stanza,
+                           std::set<std::pair<const tbl *, size_t>> &numeric_ranges)
+    : stanza_builder(c, &owner.rec), owner(owner), stanza(stanza),
+      dynamic_(stanza == ST_DYNAMIC_RESOURCE_ATTRIBUTE || stanza == ST_DYNAMIC_CLASS_ATTRIBUTE),
+      numeric_ranges(numeric_ranges) {
+    values.t.tbl_au = element_types.t.tbl_au = 32;
+    values.t.tbl_name = "DefaultValues";
 }
 
-static const attr_kind &kind_of(int stanza) { return attr_kinds[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE]; }
+zu_data_type_t attr_builder::data_type() const {
+    return dynamic_ ? zu_data_type_t(rec.d.ra_data_type) : zu_data_type_t(rec.p.ra_data_type);
+}
 
-void qecfg_compiler::init_attr(int stanza) {
-    const attr_kind &k = kind_of(stanza);
-    char *cb = attr_cb(stanza);
-    if (load<uint32_t>(cb))
-        cmplt_attr(stanza);
-    if (!cb_rsrc_class.rc_cb_ID)
-        statement_error(k.no_class_msg);
-    if (k.dynamic) {
-        rsrc_dattr_t &d = *reinterpret_cast<rsrc_dattr_t *>(cb);
-        d = rsrc_dattr_t{};
-        d.ra_cb_ID = k.id;
-        d.u_ra_variety_list.offset[0] = mk_vty_sec();
-        for (cdb_ref_t *r : {&d.u_ra_express, &d.u_ra_vclass, &d.u_ra_rearm_expr, &d.u_ra_sd})
-            set_none(reinterpret_cast<char *>(r));
-        d.ra_max_sd_idx = 0xFFFF;
+cdb_ref_t &attr_builder::sd_ref() { return dynamic_ ? rec.d.u_ra_sd : rec.p.u_ra_sd; }
+
+void attr_builder::set_max_sd_idx(uint16_t idx) { (dynamic_ ? rec.d.ra_max_sd_idx : rec.p.ra_max_sd_idx) = idx; }
+
+value_slot attr_builder::value_field() {
+    return value_slot::at(field(offsetof(rsrc_pattr_t, ra_dflt_value), offsetof(rsrc_dattr_t, ra_init_value)));
+}
+
+void attr_builder::start() {
+    if (open())
+        complete();
+    if (!owner.open())
+        c.statement_error(kind_of(stanza).no_class_msg);
+    if (dynamic_) {
+        rec.d = rsrc_dattr_t{};
+        rec.d.ra_cb_ID = kind_of(stanza).id;
+        rec.d.u_ra_variety_list.offset[0] = owner.new_section(&rsrc_class_t::u_rc_variety_lists,
+                                                              sizeof(variety_list_t), VARIETY_LIST_ID);
+        rec.d.u_ra_express = rec.d.u_ra_vclass = rec.d.u_ra_rearm_expr = rec.d.u_ra_sd = none_ref();
+        rec.d.ra_max_sd_idx = CDB_NO_SD_INDEX;
     } else {
-        rsrc_pattr_t &p = *reinterpret_cast<rsrc_pattr_t *>(cb);
-        p = rsrc_pattr_t{};
-        p.ra_cb_ID = k.id;
-        p.u_ra_variety_list.offset[0] = mk_vty_sec();
-        set_none(reinterpret_cast<char *>(&p.u_ra_sd));
-        p.ra_max_sd_idx = 0xFFFF;
+        rec.p = rsrc_pattr_t{};
+        rec.p.ra_cb_ID = kind_of(stanza).id;
+        rec.p.u_ra_variety_list.offset[0] = owner.new_section(&rsrc_class_t::u_rc_variety_lists,
+                                                              sizeof(variety_list_t), VARIETY_LIST_ID);
+        rec.p.u_ra_sd = none_ref();
+        rec.p.ra_max_sd_idx = CDB_NO_SD_INDEX;
     }
     vvdisp_tbl = nullptr;
-    *vv_found_flag(stanza) = 0;
+    valid_values_started = range_given = false;
+    release_lists(); // those of the previous attribute are spent
 }
 
-void qecfg_compiler::init_pattr_tbl() { init_attr(ST_PERSISTENT_RESOURCE_ATTRIBUTE); }
-void qecfg_compiler::init_pattrC_tbl() { init_attr(ST_PERSISTENT_CLASS_ATTRIBUTE); }
-void qecfg_compiler::init_dattr_tbl() { init_attr(ST_DYNAMIC_RESOURCE_ATTRIBUTE); }
-void qecfg_compiler::init_dattrC_tbl() { init_attr(ST_DYNAMIC_CLASS_ATTRIBUTE); }
-void qecfg_compiler::cmplt_pattr_tbl() { cmplt_attr(ST_PERSISTENT_RESOURCE_ATTRIBUTE); }
-void qecfg_compiler::cmplt_pattrC_tbl() { cmplt_attr(ST_PERSISTENT_CLASS_ATTRIBUTE); }
-void qecfg_compiler::cmplt_dattr_tbl() { cmplt_attr(ST_DYNAMIC_RESOURCE_ATTRIBUTE); }
-void qecfg_compiler::cmplt_dattrC_tbl() { cmplt_attr(ST_DYNAMIC_CLASS_ATTRIBUTE); }
+void attr_builder::release_lists() {
+    c.release_storage(&values.t);
+    c.release_storage(&element_types.t);
+}
 
-void qecfg_compiler::cmplt_attr(int stanza) {
-    const attr_kind &k = kind_of(stanza);
-    char *cb = attr_cb(stanza);
-    if (!cb_rsrc_class.rc_cb_ID)
-        statement_error(k.no_class_msg);
-    int id = set_table_id(stanza_defs[stanza].name);
-    if (id < 0)
-        statement_error(k.no_table_msg);
-    srtable_ctrl *e = &sc_tables[id];
-    if (e->req_mask != e->req_mask_cmplt) {
+void attr_builder::store_statement(const keyword_row &row, char *v) {
+    char *target = record() + row.field;
+    switch (row.what) {
+    case statement::valid_value: store_valid_value_statement(target, v); break;
+    case statement::default_value:
+    case statement::initial_value: store_default(v); break;
+    case statement::data_type: store_data_type(target, v); break;
+    case statement::variable_type: {
+        qel_variable_type_t t = QEL_COUNTER;
+        if (strToVar(v, &t) != 0)
+            c.statement_error("Invalid variable type");
+        store<uint32_t>(target, t);
+        break;
+    }
+    case statement::range: store_range(target, v); break;
+    default: stanza_builder::store_statement(row, v); break;
+    }
+}
+
+void attr_builder::store_valid_value_statement(char *target, char *v) {
+    if (!valid_values_started) {
+        store<uint32_t>(target, owner.new_section(&rsrc_class_t::u_rc_valid_vals, sizeof(valid_values_t),
+                                                  VALID_VALUES_ID));
+        valid_values_started = true;
+    }
+    store_valid_value(load<uint32_t>(target), data_type(), v);
+}
+
+// The slot is taken before the value is converted, as its trace shows.
+void attr_builder::store_default(const char *v) {
+    zu_data_type_t dt = data_type();
+    if (zu_is_sd_type(dt))
+        c.statement_error("Default values not expected; place default values in individual *SDDef stanzas.");
+    char *slot = static_cast<char *>(c.alloc_tble(&values.t, sizeof(zu_value_t)));
+    zu_value_t val{};
+    if (c.str_to_zu(&val, dt, v) != 0)
+        c.statement_error("str_to_zu: Invalid data");
+    store(slot, val);
+}
+
+void attr_builder::store_data_type(char *target, const char *v) {
+    zu_data_type_t dt = strToZuDt(v);
+    store<uint32_t>(target, dt);
+    if (dt == ZU_UNKNOWN)
+        c.statement_error("Invalid data type");
+    // A structured attribute collects the element types of the run that
+    // must follow, in a list named after its type.
+    if (zu_is_sd_type(dt))
+        element_types.t.tbl_name = dt == ZU_SD_PTR ? "ZU_SD_PTR" : "ZU_SD_PTR_ARRAY";
+}
+
+void attr_builder::store_range(char *target, char *v) {
+    zu_data_type_t dt = data_type();
+    if (is_unranged_type(dt))
+        return;
+    range_given = true;
+    if (!std::strchr(v, ','))
+        c.statement_error("Range requires two values");
+    place_pair(dt, v, value_slot::at(target), value_slot::at(target + sizeof(zu_value_t)));
+}
+
+void attr_builder::add_element_type(zu_data_type_t type) {
+    store<uint32_t>(c.alloc_tble(&element_types.t, sizeof(zu_value_t)), type);
+}
+
+// Each element gets the default of its type; an array-typed element an
+// array of its own.
+void attr_builder::build_structured_value() {
+    body_cursor array, sd_array, sd_element;
+    uint32_t n = uint32_t(element_types.size());
+    int code = dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT;
+    for (uint32_t i = 0; i < n; i++) {
+        array = body_cursor{};
+        zu_data_type_t et = load<zu_data_type_t>(element_types.t.tbl_base + i * sizeof(zu_value_t));
+        if (c.copy_this_sd_type(value_field(), et, code, strings(), &array, &sd_array, &sd_element, n, data_type()) !=
+            0)
+            c.statement_error(dynamic_ ? "dump_dflt: copy_this_sd_type init error"
+                                       : "dump_dflt: copy_this_sd_type default error");
+    }
+}
+
+void attr_builder::complete() {
+    if (given.required != stanza_defs[stanza].required_mask) {
         if (stanza == ST_DYNAMIC_CLASS_ATTRIBUTE) {
-            QECFG_TRACE(*this, "scp->req_mask:         %x\n", e->req_mask);
-            QECFG_TRACE(*this, "scp->req_mask_cmplt:   %x\n", e->req_mask_cmplt);
+            QECFG_TRACE(c, "scp->req_mask:         %x\n", given.required);
+            QECFG_TRACE(c, "scp->req_mask_cmplt:   %x\n", stanza_defs[stanza].required_mask);
         }
-        statement_error("Previous stanza incomplete");
+        c.statement_error("Previous stanza incomplete");
     }
-    size_t vv_field = k.dynamic ? offsetof(rsrc_dattr_t, u_ra_valid_vals) : offsetof(rsrc_pattr_t, u_ra_valid_vals);
-    uint16_t *vv_found = vv_found_flag(stanza);
-    if (!*vv_found)
-        set_none(cb + vv_field);
-    *vv_found = 0;
+    if (!valid_values_started)
+        set_none(field(offsetof(rsrc_pattr_t, u_ra_valid_vals), offsetof(rsrc_dattr_t, u_ra_valid_vals)));
+    valid_values_started = false;
+    tbl *table = class_table(kind_of(stanza).table);
+    if (dynamic_)
+        complete_range();
+    complete_value();
+    if (dynamic_) {
+        if (!given.has(row_named(stanza, "GroupID")))
+            rec.d.ra_group_id = CDB_DEFAULT_GROUP_ID;
+    } else if (!(rec.p.ra_props & (CDB_PA_REQD_FOR_DEFINE | CDB_PA_OPT_FOR_DEFINE))) {
+        rec.p.ra_props |= CDB_PA_INVAL_FOR_DEFINE;
+    }
+    size_t size = dynamic_ ? sizeof(rsrc_dattr_t) : sizeof(rsrc_pattr_t);
+    std::memcpy(c.alloc_tble(table, size), record(), size);
+    store<uint32_t>(record(), 0);
+}
 
-    zu_data_type_t dt = attr_data_type(e);
-    tbl *st = entry_tbl(e->sc_str_tbl);
-    tbl *table = static_cast<tbl *>((cb_rsrc_class.*k.table).ptr);
-    if (k.dynamic)
-        complete_range(stanza, dt, st, table);
-    size_t value_field = k.dynamic ? offsetof(rsrc_dattr_t, ra_init_value) : offsetof(rsrc_pattr_t, ra_dflt_value);
-    if (scalar_zu(dt) != ZU_SD_PTR) {
-        value_slot lval = value_slot::at(cb + value_field);
-        if (e->dflt.tbl && e->dflt.num_elems) {
-            dump_dflt(st, e->dflt, lval, dt);
-        } else {
-            anchor a;
-            if (copy_this_type(lval, nullptr, dt, k.dynamic ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
-                statement_error(k.dynamic ? "copy_this_type default value error (dattr)"
-                                          : "copy_this_type default value error");
+// The default or initial value: the collected values, else the default of
+// the type. A structured value is built when its run ends.
+void attr_builder::complete_value() {
+    zu_data_type_t dt = data_type();
+    if (scalar_zu(dt) == ZU_SD_PTR)
+        return;
+    tbl *st = strings();
+    if (uint32_t n = uint32_t(values.size())) {
+        body_cursor array;
+        for (uint32_t i = 0; i < n; i++) {
+            zu_value_t v = values.at(i);
+            if (c.copy_this_type(value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
+                c.statement_error("dump_dflt: copy_this_type error");
         }
+        return;
     }
-    if (k.dynamic) {
-        if ((e->opt_mask & GROUP_ID_BIT) != GROUP_ID_BIT)
-            store<uint16_t>(cb + offsetof(rsrc_dattr_t, ra_group_id), DEFAULT_GROUP_ID);
-    } else {
-        rsrc_pattr_t &p = *reinterpret_cast<rsrc_pattr_t *>(cb);
-        if (!(p.ra_props & (PA_REQD_FOR_DEFINE | PA_OPT_FOR_DEFINE)))
-            p.ra_props |= PA_INVAL_FOR_DEFINE;
-    }
-    size_t size = k.dynamic ? sizeof(rsrc_dattr_t) : sizeof(rsrc_pattr_t);
-    std::memcpy(alloc_tble(table, size), cb, size);
-    store<uint32_t>(cb, 0);
+    body_cursor a;
+    if (c.copy_this_type(value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
+        c.statement_error(dynamic_ ? "copy_this_type default value error (dattr)"
+                                   : "copy_this_type default value error");
 }
 
 // The range of a dynamic attribute: none for the reference types, the
 // default range when no Range statement was given.
-void qecfg_compiler::complete_range(int stanza, zu_data_type_t dt, tbl *st, const tbl *table) {
-    uint16_t &found = stanza == ST_DYNAMIC_RESOURCE_ATTRIBUTE ? dattr_range_found : dattrC_range_found;
-    char *cb = attr_cb(stanza);
-    char *lo = cb + offsetof(rsrc_dattr_t, ra_min_value);
-    char *hi = cb + offsetof(rsrc_dattr_t, ra_max_value);
+void attr_builder::complete_range() {
+    zu_data_type_t dt = data_type();
+    tbl *st = strings();
+    value_slot lo = value_slot::at(&rec.d.ra_min_value), hi = value_slot::at(&rec.d.ra_max_value);
     switch (dt) {
     case ZU_SD_PTR:
     case ZU_CHAR_PTR:
     case ZU_BINARY_PTR:
     case ZU_RSRC_HANDLE_PTR:
-        set_none(lo);
-        set_none(hi);
+        set_none(lo.addr());
+        set_none(hi.addr());
         break;
     default:
-        if (found) {
+        if (range_given) {
             // Plain numbers of the element type: the reversal must know.
-            if (is_numeric_array(dt))
+            if (zu_is_numeric_array(dt)) {
+                const tbl *table = class_table(kind_of(stanza).table);
                 numeric_ranges.insert({table, tbl_used(table)});
+            }
             break;
         }
         if (dt == ZU_SD_PTR_ARRAY) {
-            anchor a[3];
-            if (copy_this_sd_type(value_slot::at(lo), ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0,
-                                  ZU_SD_PTR_ARRAY) != 0)
-                statement_error("copy_this_type default min range error (dattr)");
-            anchor b[3];
-            if (copy_this_sd_type(value_slot::at(hi), ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0,
-                                  ZU_SD_PTR_ARRAY) != 0)
-                statement_error("copy_this_type default max range error (dattr)");
+            body_cursor a[3];
+            if (c.copy_this_sd_type(lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
+                c.statement_error("copy_this_type default min range error (dattr)");
+            body_cursor b[3];
+            if (c.copy_this_sd_type(hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
+                c.statement_error("copy_this_type default max range error (dattr)");
         } else {
-            anchor a;
-            if (copy_this_type(value_slot::at(lo), nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
-                statement_error("copy_this_type default min range error (dattr)");
-            anchor b;
-            if (copy_this_type(value_slot::at(hi), nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
-                statement_error("copy_this_type default max range error (dattr)");
+            body_cursor a;
+            if (c.copy_this_type(lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
+                c.statement_error("copy_this_type default min range error (dattr)");
+            body_cursor b;
+            if (c.copy_this_type(hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
+                c.statement_error("copy_this_type default max range error (dattr)");
         }
     }
-    found = 0;
-}
-
-void qecfg_compiler::dump_dflt(tbl *str_tbl, const dflt_tbl &vtbl, value_slot lval, zu_data_type_t dt) {
-    anchor array_anchor, sd_array_anchor, sd_element_anchor;
-    uint32_t n = uint32_t(vtbl.num_elems);
-    for (uint32_t i = 0; i < n; i++) {
-        const char *slot = vtbl.tbl->tbl_base + size_t(i) * sizeof(zu_value_t);
-        if (dt != ZU_SD_PTR && dt != ZU_SD_PTR_ARRAY) {
-            zu_value_t v = load<zu_value_t>(slot);
-            if (copy_this_type(lval, &v, dt, TYPE_SAME, str_tbl, &array_anchor, n) != 0)
-                statement_error("dump_dflt: copy_this_type error");
-            continue;
-        }
-        array_anchor = anchor{};
-        zu_data_type_t et = load<zu_data_type_t>(slot);
-        int code = sd_attr_type ? INIT_DEFAULT : DFLT_DEFAULT;
-        if (copy_this_sd_type(lval, et, code, str_tbl, &array_anchor, &sd_array_anchor, &sd_element_anchor, n, dt) !=
-            0)
-            statement_error(sd_attr_type ? "dump_dflt: copy_this_sd_type init error"
-                                         : "dump_dflt: copy_this_sd_type default error");
-    }
+    range_given = false;
 }

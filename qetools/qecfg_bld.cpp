@@ -14,7 +14,6 @@
 
 namespace {
 
-constexpr uint16_t CLASS_ID_BIT = 0x8000;
 constexpr size_t MAX_TABLE_RECORDS = 65535;
 constexpr uint64_t MAX_IMAGE = uint64_t(1) << 32;
 constexpr size_t EXTEND_BLOCK = 1024;
@@ -24,7 +23,7 @@ const char *string_at(const tbl *t, uint32_t off) {
                                                                                              : nullptr;
 }
 
-tbl *ref_tbl(const char *rec, size_t field) { return static_cast<tbl *>(load<void *>(rec + field)); }
+tbl *ref_tbl(const char *rec, size_t field) { return ref_table(load<cdb_ref_t>(rec + field)); }
 
 } // namespace
 
@@ -32,11 +31,11 @@ tbl *ref_tbl(const char *rec, size_t field) { return static_cast<tbl *>(load<voi
 // Variable ID tables.
 
 void qecfg_compiler::bld_var_id_tbls() {
-    size_t n = tbl_used(&rsrc_class_tbl) / sizeof(rsrc_class_t);
+    size_t n = tbl_used(&classes.t) / sizeof(rsrc_class_t);
     for (size_t i = 0; i < n; i++) {
-        const char *rc = rsrc_class_tbl.tbl_base + i * sizeof(rsrc_class_t);
+        const char *rc = classes.t.tbl_base + i * sizeof(rsrc_class_t);
         const tbl *strings = ref_tbl(rc, offsetof(rsrc_class_t, u_rc_strings));
-        const std::pair<size_t, uint32_t> kinds[] = {{offsetof(rsrc_class_t, u_rc_dattrsC), CLASS_ID_BIT},
+        const std::pair<size_t, uint32_t> kinds[] = {{offsetof(rsrc_class_t, u_rc_dattrsC), CDB_CLASS_VAR_ID_BIT},
                                                      {offsetof(rsrc_class_t, u_rc_dattrs), 0}};
         for (auto [field, id_bit] : kinds) {
             tbl *dattrs = ref_tbl(rc, field);
@@ -58,11 +57,11 @@ void qecfg_compiler::bld_var_id_tbls() {
 void qecfg_compiler::add_varID_to_var_class(const char *srch_name, uint32_t varID) {
     if (var_class_index.empty()) {
         // The first variable class of a name wins; unnamed ones match nothing.
-        size_t n = tbl_used(&rsrc_var_class_tbl) / sizeof(rsrc_variable_class_t);
+        size_t n = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
         for (size_t i = 0; i < n; i++) {
-            const char *rec = rsrc_var_class_tbl.tbl_base + i * sizeof(rsrc_variable_class_t);
+            const char *rec = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
             const tbl *strings = ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
-            const char *name = rvc_named[i] ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
+            const char *name = vclass.named[i] ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
                                             : nullptr;
             if (name)
                 var_class_index.emplace(name, uint32_t(i * sizeof(rsrc_variable_class_t)));
@@ -72,7 +71,7 @@ void qecfg_compiler::add_varID_to_var_class(const char *srch_name, uint32_t varI
     auto it = var_class_index.find(srch_name);
     if (it == var_class_index.end() || it->second == CDB_NONE)
         return;
-    char *rec = rsrc_var_class_tbl.tbl_base + it->second;
+    char *rec = var_classes.t.tbl_base + it->second;
     tbl *ids = find_tbl_entry(rec);
     if (!ids) {
         ids = new_tbl("VariableIDs", 64);
@@ -84,7 +83,7 @@ void qecfg_compiler::add_varID_to_var_class(const char *srch_name, uint32_t varI
 }
 
 tbl *qecfg_compiler::find_tbl_entry(const void *rvcp) const {
-    auto key = uint32_t(static_cast<const char *>(rvcp) - rsrc_var_class_tbl.tbl_base);
+    auto key = uint32_t(static_cast<const char *>(rvcp) - var_classes.t.tbl_base);
     auto it = var_id_tbls.find(key);
     return it == var_id_tbls.end() ? nullptr : it->second;
 }
@@ -93,28 +92,28 @@ tbl *qecfg_compiler::find_tbl_entry(const void *rvcp) const {
 // Size.
 
 size_t qecfg_compiler::cdb_size() {
-    uint32_t dsect_count = rsrc_cmmap_count + rsrc_mgr_count + rsrc_var_class_count + rsrc_class_count;
+    uint32_t dsect_count = maps.count + managers.count + var_classes.count + classes.count;
     uint64_t size = CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * uint64_t(dsect_count);
-    size_t nvc = tbl_used(&rsrc_var_class_tbl) / sizeof(rsrc_variable_class_t);
+    size_t nvc = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
     for (size_t i = 0; i < nvc; i++) {
-        const char *rec = rsrc_var_class_tbl.tbl_base + i * sizeof(rsrc_variable_class_t);
+        const char *rec = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         uint32_t count = load<uint32_t>(rec + offsetof(rsrc_variable_class_t, rvc_var_count));
         size += sizeof(rsrc_variable_class_t) + round8(tbl_used(ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl)))) +
                 round8(4 * size_t(count));
     }
-    size_t nmap = tbl_used(&rsrc_cmmap_tbl) / sizeof(rsrc_cmmap_t);
+    size_t nmap = tbl_used(&maps.t) / sizeof(rsrc_cmmap_t);
     for (size_t i = 0; i < nmap; i++)
         size += sizeof(rsrc_cmmap_t) +
-                round8(tbl_used(ref_tbl(rsrc_cmmap_tbl.tbl_base + i * sizeof(rsrc_cmmap_t), offsetof(rsrc_cmmap_t, u_rcm_strings))));
-    size_t nmgr = tbl_used(&rsrc_mgr_tbl) / sizeof(rsrc_mgr_t);
+                round8(tbl_used(ref_tbl(maps.t.tbl_base + i * sizeof(rsrc_cmmap_t), offsetof(rsrc_cmmap_t, u_rcm_strings))));
+    size_t nmgr = tbl_used(&managers.t) / sizeof(rsrc_mgr_t);
     for (size_t i = 0; i < nmgr; i++)
         size += sizeof(rsrc_mgr_t) +
-                round8(tbl_used(ref_tbl(rsrc_mgr_tbl.tbl_base + i * sizeof(rsrc_mgr_t), offsetof(rsrc_mgr_t, u_rm_strings_table))));
-    size_t ncl = tbl_used(&rsrc_class_tbl) / sizeof(rsrc_class_t);
+                round8(tbl_used(ref_tbl(managers.t.tbl_base + i * sizeof(rsrc_mgr_t), offsetof(rsrc_mgr_t, u_rm_strings_table))));
+    size_t ncl = tbl_used(&classes.t) / sizeof(rsrc_class_t);
     for (size_t i = 0; i < ncl; i++)
-        size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(rsrc_class_tbl.tbl_base + i * sizeof(rsrc_class_t)));
+        size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(classes.t.tbl_base + i * sizeof(rsrc_class_t)));
     if (size >= MAX_IMAGE)
-        bld_error_exit("CDB image exceeds 4 GiB", nullptr, nullptr, 1);
+        raise_output_fatal("CDB image exceeds 4 GiB", nullptr, nullptr, 1);
     return size_t(size);
 }
 
@@ -125,7 +124,7 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
         const tbl *t = static_cast<const tbl *>(ref.ptr);
         size_t n = tbl_used(t) / rec_size;
         if (n > MAX_TABLE_RECORDS)
-            bld_error_exit("Too many records in table: ", t->tbl_name, nullptr, 1);
+            raise_output_fatal("Too many records in table: ", t->tbl_name, nullptr, 1);
         return uint16_t(n);
     };
     auto bytes = [](const cdb_ref_t &ref) { return tbl_used(static_cast<const tbl *>(ref.ptr)); };
@@ -148,12 +147,12 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
 // ---------------------------------------------------------------------------
 // The output file.
 
-void qecfg_compiler::bld_error_exit(const char *msg, const char *v1, const char *v2, int code) {
+void qecfg_compiler::raise_output_fatal(const char *msg, const char *v1, const char *v2, int code) {
     release_output(true);
     std::string text;
     if (msg) {
         text = std::string(msg) + (v1 ? v1 : "") + (v2 ? v2 : "");
-        if (opt.interactive)
+        if (opt.newline_after_message)
             text += "\n";
     }
     throw qecfg_fatal{text, code};
@@ -176,7 +175,7 @@ void qecfg_compiler::release_output(bool remove_file) {
 }
 
 [[noreturn]] void qecfg_compiler::output_error(const char *msg, int err) {
-    bld_error_exit(msg, std::strerror(err), nullptr, 1);
+    raise_output_fatal(msg, std::strerror(err), nullptr, 1);
 }
 
 char *qecfg_compiler::get_mapfile(size_t cdb_file_size) {
@@ -255,19 +254,10 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounde
     release_storage(t);
 }
 
-// Once its bytes are in the image a table's storage is given back, so that
-// the tables and the image are not both held in memory in full.
-void qecfg_compiler::release_storage(tbl *t) {
-    if (!t || !t->tbl_base)
-        return;
-    std::free(t->tbl_base);
-    *t = tbl{nullptr, nullptr, nullptr, 0, nullptr, t->tbl_au, t->tbl_name, 0};
-}
-
 void qecfg_compiler::add_rsrc_class_tbls() {
-    size_t n = tbl_used(&rsrc_class_tbl) / sizeof(rsrc_class_t);
+    size_t n = tbl_used(&classes.t) / sizeof(rsrc_class_t);
     if (!n)
-        bld_error_exit("No Rsrc Class Tables found", nullptr, nullptr, 1);
+        raise_output_fatal("No Rsrc Class Tables found", nullptr, nullptr, 1);
     static const size_t copied[] = {
         offsetof(rsrc_class_t, u_rc_pattrsC),  offsetof(rsrc_class_t, u_rc_dattrsC),
         offsetof(rsrc_class_t, u_rc_pattrs),   offsetof(rsrc_class_t, u_rc_dattrs),
@@ -276,7 +266,7 @@ void qecfg_compiler::add_rsrc_class_tbls() {
         offsetof(rsrc_class_t, u_rc_valid_vals),
     };
     for (size_t i = 0; i < n; i++) {
-        const char *src = rsrc_class_tbl.tbl_base + i * sizeof(rsrc_class_t);
+        const char *src = classes.t.tbl_base + i * sizeof(rsrc_class_t);
         char *rec = copy_record(CDB_DSECT_CLASS, src, sizeof(rsrc_class_t));
         for (size_t field : copied) {
             tbl *t = ref_tbl(src, field);
@@ -304,11 +294,11 @@ void qecfg_compiler::note_numeric_ranges(const tbl *t) {
 }
 
 void qecfg_compiler::add_rsrc_mgr_tbls() {
-    size_t n = tbl_used(&rsrc_mgr_tbl) / sizeof(rsrc_mgr_t);
+    size_t n = tbl_used(&managers.t) / sizeof(rsrc_mgr_t);
     if (!n)
-        bld_error_exit("No Rsrc Manager tables", nullptr, nullptr, 1);
+        raise_output_fatal("No Rsrc Manager tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
-        const char *src = rsrc_mgr_tbl.tbl_base + i * sizeof(rsrc_mgr_t);
+        const char *src = managers.t.tbl_base + i * sizeof(rsrc_mgr_t);
         char *rec = copy_record(CDB_DSECT_RSRC_MGR, src, sizeof(rsrc_mgr_t));
         copy_table(rec, offsetof(rsrc_mgr_t, u_rm_strings_table), ref_tbl(src, offsetof(rsrc_mgr_t, u_rm_strings_table)),
                    true);
@@ -323,11 +313,11 @@ void qecfg_compiler::add_rsrc_mgr_tbls() {
 }
 
 void qecfg_compiler::add_rsrc_cmmap_tbls() {
-    size_t n = tbl_used(&rsrc_cmmap_tbl) / sizeof(rsrc_cmmap_t);
+    size_t n = tbl_used(&maps.t) / sizeof(rsrc_cmmap_t);
     if (!n)
-        bld_error_exit("No Rsrc CMMAP tables", nullptr, nullptr, 1);
+        raise_output_fatal("No Rsrc CMMAP tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
-        const char *src = rsrc_cmmap_tbl.tbl_base + i * sizeof(rsrc_cmmap_t);
+        const char *src = maps.t.tbl_base + i * sizeof(rsrc_cmmap_t);
         char *rec = copy_record(CDB_DSECT_CMMAP, src, sizeof(rsrc_cmmap_t));
         copy_table(rec, offsetof(rsrc_cmmap_t, u_rcm_strings), ref_tbl(src, offsetof(rsrc_cmmap_t, u_rcm_strings)), true);
         dsect_idx++;
@@ -335,11 +325,11 @@ void qecfg_compiler::add_rsrc_cmmap_tbls() {
 }
 
 void qecfg_compiler::add_rsrc_var_class_tbls() {
-    size_t n = tbl_used(&rsrc_var_class_tbl) / sizeof(rsrc_variable_class_t);
+    size_t n = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
     if (!n)
-        bld_error_exit("No Rsrc Variable Class tables", nullptr, nullptr, 1);
+        raise_output_fatal("No Rsrc Variable Class tables", nullptr, nullptr, 1);
     for (size_t i = 0; i < n; i++) {
-        const char *src = rsrc_var_class_tbl.tbl_base + i * sizeof(rsrc_variable_class_t);
+        const char *src = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         char *rec = copy_record(CDB_DSECT_VAR_CLASS, src, sizeof(rsrc_variable_class_t));
         tbl *strings = ref_tbl(src, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
         size_t len = tbl_used(strings);
@@ -376,7 +366,7 @@ static qel_timeval32_t build_time() {
 }
 
 void qecfg_compiler::bld_cdb() {
-    dsect_count = rsrc_cmmap_count + rsrc_mgr_count + rsrc_var_class_count + rsrc_class_count;
+    dsect_count = maps.count + managers.count + var_classes.count + classes.count;
     size_t size = cdb_size();
     chp = get_mapfile(size);
     dsect_idx = 0;
@@ -385,7 +375,7 @@ void qecfg_compiler::bld_cdb() {
     add_rsrc_class_tbls();
     add_rsrc_mgr_tbls();
     add_rsrc_cmmap_tbls();
-    if (rsrc_var_class_tbl.tbl_base)
+    if (var_classes.t.tbl_base)
         add_rsrc_var_class_tbls();
 
     qel_cdb_header_t h{};
@@ -405,9 +395,7 @@ void qecfg_compiler::bld_cdb() {
     h.cdb_hdr_rsrc_error_size = sizeof(rsrc_error_t);
     h.cdb_hdr_rsrc_depend_size = sizeof(rsrc_depend_t);
     std::memcpy(chp, &h, sizeof h);
-    uint32_t sum = h.cdb_hdr_length;
-    for (uint32_t i = 0; i < (h.cdb_hdr_length - 4) / 4; i++)
-        sum ^= load<uint32_t>(chp + 8 + 4 * size_t(i));
+    uint32_t sum = cdb_checksum(h.cdb_hdr_length, [&](size_t off) { return load<uint32_t>(chp + off); });
     store<uint32_t>(chp + offsetof(qel_cdb_header_t, cdb_hdr_checksum), sum);
     flush_mapfile();
 }

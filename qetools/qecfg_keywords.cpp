@@ -1,133 +1,148 @@
-// The source language as data: the stanza types with their attribute rows.
+// The source language as data: the stanza types with their keyword rows.
 // The property keywords and permission letters are shared with every reader
 // of a CDB (cdb.h).
 #include <cstddef>
+#include <cstring>
 
-#include "qecfg.h"
+#include "cdb.h"
+#include "qecfg_keywords.h"
 
-#define ROW(rec, name, code, field, bit, dup) {name, code, int(offsetof(rec, field)), bit, dup}
+#define ROW(rec, name, what, field, bit, optional, repeatable) \
+    {name, statement::what, uint16_t(offsetof(rec, field)), bit, optional, repeatable}
+constexpr bool REQ = false, OPT = true, ONCE = false, DUP = true;
 
-static const table_attrs control_definition_attrs[] = {
-    ROW(rsrc_class_t, "FileVersion", 5, rc_version, 0x1, 0),
+static const keyword_row control_definition_rows[] = {
+    ROW(rsrc_class_t, "FileVersion", version, rc_version, 0x1, REQ, ONCE),
 };
 
-static const table_attrs cmmap_attrs[] = {
-    ROW(rsrc_cmmap_t, "ResourceManager", 7, rcm_rm_ID, 0x1, 0),
-    ROW(rsrc_cmmap_t, "FirstKey", 1, rcm_first_key, 0x2, 0),
-    ROW(rsrc_cmmap_t, "LastKey", 1, rcm_last_key, 0x4, 0),
-    ROW(rsrc_cmmap_t, "MessageCatalog", 3, u_rcm_msg_file, 0x8, 0),
-    ROW(rsrc_cmmap_t, "DescriptiveMessageSet", 1, rcm_dscr_msg_set, 0x10, 0),
+static const keyword_row cmmap_rows[] = {
+    ROW(rsrc_cmmap_t, "ResourceManager", resource_manager, rcm_rm_ID, 0x1, REQ, ONCE),
+    ROW(rsrc_cmmap_t, "FirstKey", number16, rcm_first_key, 0x2, REQ, ONCE),
+    ROW(rsrc_cmmap_t, "LastKey", number16, rcm_last_key, 0x4, REQ, ONCE),
+    ROW(rsrc_cmmap_t, "MessageCatalog", text, u_rcm_msg_file, 0x8, REQ, ONCE),
+    ROW(rsrc_cmmap_t, "DescriptiveMessageSet", number16, rcm_dscr_msg_set, 0x10, REQ, ONCE),
 };
 
-static const table_attrs variable_class_attrs[] = {
-    ROW(rsrc_variable_class_t, "ObservationInterval", 1, rvc_obsv_interval, 0x2, 0),
-    ROW(rsrc_variable_class_t, "ReportingInterval", 1, rvc_report_interval, 0x4, 0),
-    ROW(rsrc_variable_class_t, "VariableClass", 3, u_rvc_name, 0x1, 0),
-    ROW(rsrc_variable_class_t, "Alias", 3, u_rvc_compat_name, 0x80000001, 0),
+static const keyword_row variable_class_rows[] = {
+    ROW(rsrc_variable_class_t, "ObservationInterval", number16, rvc_obsv_interval, 0x2, REQ, ONCE),
+    ROW(rsrc_variable_class_t, "ReportingInterval", number16, rvc_report_interval, 0x4, REQ, ONCE),
+    ROW(rsrc_variable_class_t, "VariableClass", text, u_rvc_name, 0x1, REQ, ONCE),
+    ROW(rsrc_variable_class_t, "Alias", text, u_rvc_compat_name, 0x1, OPT, ONCE),
 };
 
-static const table_attrs resource_class_attrs[] = {
-    ROW(rsrc_class_t, "Properties", 4, rc_props, 0x4, 0),
-    ROW(rsrc_class_t, "ClassPermTemplate", 6, rc_perm_tempC, 0x8, 0),
-    ROW(rsrc_class_t, "ResourcePermTemplate", 6, rc_perm_temp, 0x10, 0),
-    ROW(rsrc_class_t, "Locator", 8, rc_locator, 0x80000002, 0),
-    ROW(rsrc_class_t, "Description", 1, rc_dscr_msgid, 0x1, 0),
-    ROW(rsrc_class_t, "DisplayName", 1, rc_disp_msgid, 0x2, 0),
-    ROW(rsrc_class_t, "Name", 3, u_rc_name, 0x80000010, 0),
+static const keyword_row resource_class_rows[] = {
+    ROW(rsrc_class_t, "Properties", class_properties, rc_props, 0x4, REQ, ONCE),
+    ROW(rsrc_class_t, "ClassPermTemplate", permission_template, rc_perm_tempC, 0x8, REQ, ONCE),
+    ROW(rsrc_class_t, "ResourcePermTemplate", permission_template, rc_perm_temp, 0x10, REQ, ONCE),
+    ROW(rsrc_class_t, "Locator", locator, rc_locator, 0x2, OPT, ONCE),
+    ROW(rsrc_class_t, "Description", number16, rc_dscr_msgid, 0x1, REQ, ONCE),
+    ROW(rsrc_class_t, "DisplayName", number16, rc_disp_msgid, 0x2, REQ, ONCE),
+    ROW(rsrc_class_t, "Name", text, u_rc_name, 0x10, OPT, ONCE),
 };
 
-static const table_attrs pattr_attrs[] = {
-    ROW(rsrc_pattr_t, "Name", 3, u_ra_name, 0x1, 0),
-    ROW(rsrc_pattr_t, "Description", 1, ra_dscr_msgid, 0x2, 0),
-    ROW(rsrc_pattr_t, "DisplayName", 1, ra_disp_msgid, 0x4, 0),
-    ROW(rsrc_pattr_t, "Id", 9, ra_attr_id, 0x8, 0),
-    ROW(rsrc_pattr_t, "DataType", 17, ra_data_type, 0x10, 0),
-    ROW(rsrc_pattr_t, "VarietyRange", 10, u_ra_variety_list, 0x20, 1),
-    ROW(rsrc_pattr_t, "GroupID", 1, ra_group_id, 0x80000001, 0),
-    ROW(rsrc_pattr_t, "GroupName", 1, ra_group_msgid, 0x80000002, 0),
-    ROW(rsrc_pattr_t, "Properties", 11, ra_props, 0x80000004, 0),
-    ROW(rsrc_pattr_t, "ValidValue", 14, u_ra_valid_vals, 0x80000010, 1),
-    ROW(rsrc_pattr_t, "ValueDisplayName", 16, u_ra_valid_vals, 0x80000020, 1),
-    ROW(rsrc_pattr_t, "DefaultValue", 15, ra_dflt_value, 0x80000008, 1),
-    ROW(rsrc_pattr_t, "ListActionRsrc", 30, ra_dflt_value, 0x80000040, 0),
-    ROW(rsrc_pattr_t, "ListActionClass", 29, ra_dflt_value, 0x80000080, 0),
+static const keyword_row pattr_rows[] = {
+    ROW(rsrc_pattr_t, "Name", text, u_ra_name, 0x1, REQ, ONCE),
+    ROW(rsrc_pattr_t, "Description", number16, ra_dscr_msgid, 0x2, REQ, ONCE),
+    ROW(rsrc_pattr_t, "DisplayName", number16, ra_disp_msgid, 0x4, REQ, ONCE),
+    ROW(rsrc_pattr_t, "Id", identifier, ra_attr_id, 0x8, REQ, ONCE),
+    ROW(rsrc_pattr_t, "DataType", data_type, ra_data_type, 0x10, REQ, ONCE),
+    ROW(rsrc_pattr_t, "VarietyRange", variety_range, u_ra_variety_list, 0x20, REQ, DUP),
+    ROW(rsrc_pattr_t, "GroupID", number16, ra_group_id, 0x1, OPT, ONCE),
+    ROW(rsrc_pattr_t, "GroupName", number16, ra_group_msgid, 0x2, OPT, ONCE),
+    ROW(rsrc_pattr_t, "Properties", pattr_properties, ra_props, 0x4, OPT, ONCE),
+    ROW(rsrc_pattr_t, "ValidValue", valid_value, u_ra_valid_vals, 0x10, OPT, DUP),
+    ROW(rsrc_pattr_t, "ValueDisplayName", value_display_name, u_ra_valid_vals, 0x20, OPT, DUP),
+    ROW(rsrc_pattr_t, "DefaultValue", default_value, ra_dflt_value, 0x8, OPT, DUP),
+    ROW(rsrc_pattr_t, "ListActionRsrc", list_action, ra_dflt_value, 0x40, OPT, ONCE),
+    ROW(rsrc_pattr_t, "ListActionClass", list_action, ra_dflt_value, 0x80, OPT, ONCE),
 };
 
-static const table_attrs dattr_attrs[] = {
-    ROW(rsrc_dattr_t, "Name", 3, u_ra_name, 0x1, 0),
-    ROW(rsrc_dattr_t, "VariableClass", 3, u_ra_vclass, 0x80000100, 0),
-    ROW(rsrc_dattr_t, "Description", 1, ra_dscr_msgid, 0x2, 0),
-    ROW(rsrc_dattr_t, "DisplayName", 1, ra_disp_msgid, 0x4, 0),
-    ROW(rsrc_dattr_t, "Id", 9, ra_attr_id, 0x8, 0),
-    ROW(rsrc_dattr_t, "DataType", 17, ra_data_type, 0x10, 0),
-    ROW(rsrc_dattr_t, "VariableType", 18, ra_var_type, 0x40, 0),
-    ROW(rsrc_dattr_t, "VarietyRange", 10, u_ra_variety_list, 0x20, 1),
-    ROW(rsrc_dattr_t, "GroupID", 1, ra_group_id, 0x80000001, 0),
-    ROW(rsrc_dattr_t, "GroupName", 1, ra_group_msgid, 0x80000002, 0),
-    ROW(rsrc_dattr_t, "Properties", 12, ra_props, 0x80000004, 0),
-    ROW(rsrc_dattr_t, "InitialValue", 20, ra_init_value, 0x80000008, 0),
-    ROW(rsrc_dattr_t, "ValidStateValue", 14, u_ra_valid_vals, 0x80000010, 1),
-    ROW(rsrc_dattr_t, "ValueDisplayName", 16, ra_max_value, 0x80000020, 1),
-    ROW(rsrc_dattr_t, "Expression", 3, u_ra_express, 0x80000400, 0),
-    ROW(rsrc_dattr_t, "ExpressionDescription", 1, ra_expr_desc, 0x80000800, 0),
-    ROW(rsrc_dattr_t, "ReArmExpression", 3, u_ra_rearm_expr, 0x80001000, 0),
-    ROW(rsrc_dattr_t, "ReArmDescription", 1, ra_rearm_desc, 0x80002000, 0),
-    ROW(rsrc_dattr_t, "Range", 19, ra_min_value, 0x80000200, 0),
-    ROW(rsrc_dattr_t, "ListActionRsrc", 30, ra_init_value, 0x80000040, 0),
-    ROW(rsrc_dattr_t, "ListActionClass", 29, ra_init_value, 0x80000080, 0),
+static const keyword_row dattr_rows[] = {
+    ROW(rsrc_dattr_t, "Name", text, u_ra_name, 0x1, REQ, ONCE),
+    ROW(rsrc_dattr_t, "VariableClass", text, u_ra_vclass, 0x100, OPT, ONCE),
+    ROW(rsrc_dattr_t, "Description", number16, ra_dscr_msgid, 0x2, REQ, ONCE),
+    ROW(rsrc_dattr_t, "DisplayName", number16, ra_disp_msgid, 0x4, REQ, ONCE),
+    ROW(rsrc_dattr_t, "Id", identifier, ra_attr_id, 0x8, REQ, ONCE),
+    ROW(rsrc_dattr_t, "DataType", data_type, ra_data_type, 0x10, REQ, ONCE),
+    ROW(rsrc_dattr_t, "VariableType", variable_type, ra_var_type, 0x40, REQ, ONCE),
+    ROW(rsrc_dattr_t, "VarietyRange", variety_range, u_ra_variety_list, 0x20, REQ, DUP),
+    ROW(rsrc_dattr_t, "GroupID", number16, ra_group_id, 0x1, OPT, ONCE),
+    ROW(rsrc_dattr_t, "GroupName", number16, ra_group_msgid, 0x2, OPT, ONCE),
+    ROW(rsrc_dattr_t, "Properties", dattr_properties, ra_props, 0x4, OPT, ONCE),
+    ROW(rsrc_dattr_t, "InitialValue", initial_value, ra_init_value, 0x8, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ValidStateValue", valid_value, u_ra_valid_vals, 0x10, OPT, DUP),
+    ROW(rsrc_dattr_t, "ValueDisplayName", value_display_name, ra_max_value, 0x20, OPT, DUP),
+    ROW(rsrc_dattr_t, "Expression", text, u_ra_express, 0x400, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ExpressionDescription", number16, ra_expr_desc, 0x800, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ReArmExpression", text, u_ra_rearm_expr, 0x1000, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ReArmDescription", number16, ra_rearm_desc, 0x2000, OPT, ONCE),
+    ROW(rsrc_dattr_t, "Range", range, ra_min_value, 0x200, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ListActionRsrc", list_action, ra_init_value, 0x40, OPT, ONCE),
+    ROW(rsrc_dattr_t, "ListActionClass", list_action, ra_init_value, 0x80, OPT, ONCE),
 };
 
-static const table_attrs action_attrs[] = {
-    ROW(rsrc_action_t, "Name", 3, u_ac_name, 0x1, 0),
-    ROW(rsrc_action_t, "Description", 1, ac_dscr_msgid, 0x2, 0),
-    ROW(rsrc_action_t, "DisplayName", 1, ac_disp_msgid, 0x4, 0),
-    ROW(rsrc_action_t, "Id", 9, ac_action_id, 0x8, 0),
-    ROW(rsrc_action_t, "VarietyRange", 10, u_ac_variety_list, 0x10, 1),
-    ROW(rsrc_action_t, "Properties", 13, ac_props, 0x80000001, 0),
-    ROW(rsrc_action_t, "Permission", 31, ac_perms, 0x80000004, 0),
-    ROW(rsrc_action_t, "ConfirmationMsg", 1, ac_confirm_msgid, 0x80000008, 0),
-    ROW(rsrc_action_t, "TimeOut", 1, ac_timeout, 0x80000002, 0),
+static const keyword_row action_rows[] = {
+    ROW(rsrc_action_t, "Name", text, u_ac_name, 0x1, REQ, ONCE),
+    ROW(rsrc_action_t, "Description", number16, ac_dscr_msgid, 0x2, REQ, ONCE),
+    ROW(rsrc_action_t, "DisplayName", number16, ac_disp_msgid, 0x4, REQ, ONCE),
+    ROW(rsrc_action_t, "Id", identifier, ac_action_id, 0x8, REQ, ONCE),
+    ROW(rsrc_action_t, "VarietyRange", variety_range, u_ac_variety_list, 0x10, REQ, DUP),
+    ROW(rsrc_action_t, "Properties", action_properties, ac_props, 0x1, OPT, ONCE),
+    ROW(rsrc_action_t, "Permission", permission, ac_perms, 0x4, OPT, ONCE),
+    ROW(rsrc_action_t, "ConfirmationMsg", number16, ac_confirm_msgid, 0x8, OPT, ONCE),
+    ROW(rsrc_action_t, "TimeOut", number16, ac_timeout, 0x2, OPT, ONCE),
 };
 
-// The element statements store into the element being built, not through the
-// row's offset, which designates sd_count in every row.
-static const table_attrs sd_attrs[] = {
-    ROW(sd_def_t, "ElementName", 22, sd_count, 0x1, 0),
-    ROW(sd_def_t, "Description", 23, sd_count, 0x2, 0),
-    ROW(sd_def_t, "DisplayName", 24, sd_count, 0x4, 0),
-    ROW(sd_def_t, "ElementIndex", 21, sd_count, 0x8, 0),
-    ROW(sd_def_t, "DataType", 25, sd_count, 0x10, 0),
-    ROW(sd_def_t, "ValidValue", 26, sd_count, 0x80000002, 1),
-    ROW(sd_def_t, "ValueDisplayName", 27, sd_count, 0x80000004, 1),
-    ROW(sd_def_t, "DefaultValue", 28, sd_count, 0x80000001, 1),
+// The element statements store into the element being built.
+static const keyword_row sd_rows[] = {
+    ROW(sd_field, "ElementName", text, u_sd_field_name, 0x1, REQ, ONCE),
+    ROW(sd_field, "Description", number16, sd_dscr_msgid, 0x2, REQ, ONCE),
+    ROW(sd_field, "DisplayName", number16, sd_disp_msgid, 0x4, REQ, ONCE),
+    ROW(sd_field, "ElementIndex", element_index, sd_field_type, 0x8, REQ, ONCE),
+    ROW(sd_field, "DataType", element_data_type, sd_field_type, 0x10, REQ, ONCE),
+    ROW(sd_field, "ValidValue", element_valid_value, u_sd_valid_vals, 0x2, OPT, DUP),
+    ROW(sd_field, "ValueDisplayName", value_display_name, u_sd_valid_vals, 0x4, OPT, DUP),
+    ROW(sd_field, "DefaultValue", element_default_value, sd_field_type, 0x1, OPT, DUP),
 };
 
 #undef ROW
 
-#define ATTRS(a) int(sizeof(a) / sizeof(a[0])), a
+template <size_t N> constexpr bool fits(const keyword_row (&)[N]) { return N <= MAX_ROWS_PER_STANZA; }
+static_assert(fits(control_definition_rows) && fits(cmmap_rows) && fits(variable_class_rows) &&
+              fits(resource_class_rows) && fits(pattr_rows) && fits(dattr_rows) && fits(action_rows) &&
+              fits(sd_rows));
+
+#define ROWS(a) int(sizeof(a) / sizeof(a[0])), a
 
 const stanza_def stanza_defs[NUM_STANZA_TYPES] = {
-    {"ControlDefinition", ATTRS(control_definition_attrs), 0x1},
-    {"ClassToManagerMapping", ATTRS(cmmap_attrs), 0x1f},
-    {"ResourceVariableClass", ATTRS(variable_class_attrs), 0x7},
-    {"ResourceClass", ATTRS(resource_class_attrs), 0x1f},
-    {"PersistentResourceAttribute", ATTRS(pattr_attrs), 0x3f},
-    {"PersistentClassAttribute", ATTRS(pattr_attrs), 0x3f},
-    {"DynamicResourceAttribute", ATTRS(dattr_attrs), 0x7f},
-    {"DynamicClassAttribute", ATTRS(dattr_attrs), 0x7f},
-    {"ClassAction", ATTRS(action_attrs), 0x1f},
-    {"ResourceAction", ATTRS(action_attrs), 0x1f},
-    {"PAttrSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"DAttrSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"DefineSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"UndefineSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"OnlineSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"OfflineSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"ResetSDDefinition", ATTRS(sd_attrs), 0x1f},
-    {"ActionInSDDefinition", ATTRS(sd_attrs), 0x1f},
+    {"ControlDefinition", ROWS(control_definition_rows), 0x1, SD_TYPE_UNKNOWN},
+    {"ClassToManagerMapping", ROWS(cmmap_rows), 0x1f, SD_TYPE_UNKNOWN},
+    {"ResourceVariableClass", ROWS(variable_class_rows), 0x7, SD_TYPE_UNKNOWN},
+    {"ResourceClass", ROWS(resource_class_rows), 0x1f, SD_TYPE_UNKNOWN},
+    {"PersistentResourceAttribute", ROWS(pattr_rows), 0x3f, SD_TYPE_UNKNOWN},
+    {"PersistentClassAttribute", ROWS(pattr_rows), 0x3f, SD_TYPE_UNKNOWN},
+    {"DynamicResourceAttribute", ROWS(dattr_rows), 0x7f, SD_TYPE_UNKNOWN},
+    {"DynamicClassAttribute", ROWS(dattr_rows), 0x7f, SD_TYPE_UNKNOWN},
+    {"ClassAction", ROWS(action_rows), 0x1f, SD_TYPE_UNKNOWN},
+    {"ResourceAction", ROWS(action_rows), 0x1f, SD_TYPE_UNKNOWN},
+    {"PAttrSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_PATTR},
+    {"DAttrSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_DATTR},
+    {"DefineSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_DEFINE},
+    {"UndefineSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_UNDEFINE},
+    {"OnlineSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_ONLINE},
+    {"OfflineSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_OFFLINE},
+    {"ResetSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_RESET},
+    {"ActionInSDDefinition", ROWS(sd_rows), 0x1f, SD_TYPE_ACT_IN},
     // Its required rows carry only 0x1 to 0x10, so no optional statement is
     // ever accepted in a response definition.
-    {"ActionOutSDDefinition", ATTRS(sd_attrs), 0x7f},
+    {"ActionOutSDDefinition", ROWS(sd_rows), 0x7f, SD_TYPE_ACT_RESP},
 };
 
-#undef ATTRS
+#undef ROWS
+
+const keyword_row &row_named(int stanza, const char *name) {
+    const keyword_row *row = stanza_defs[stanza].rows;
+    while (std::strcmp(row->name, name) != 0)
+        row++;
+    return *row;
+}

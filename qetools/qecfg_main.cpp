@@ -11,7 +11,7 @@ int main(int argc, char **argv) {
     int c;
     while ((c = getopt(argc, argv, "nd:s")) != -1) {
         switch (c) {
-        case 'n': opt.interactive = 0; break;
+        case 'n': opt.newline_after_message = 0; break;
         case 'd': opt.debugLevel = std::atoi(optarg); break;
         case 's': opt.swap_endianness = 1; break;
         default: return 1; // getopt has said what is wrong
@@ -20,11 +20,11 @@ int main(int argc, char **argv) {
     try {
         qecfg_compiler compile(opt);
         if (optind >= argc)
-            compile.qecfg_error_exit_rtn("Usage: ", argv[0],
+            compile.raise_fatal("Usage: ", argv[0],
                                          " [-s] cdefsrc_filename cdef_filename\n    -s Reverse endianness of CDB.\n",
                                          0, 1);
         if (optind + 1 >= argc)
-            compile.qecfg_error_exit_rtn("usage: ", argv[0], " cdefsrc_filename cdef_filename", 0, 1);
+            compile.raise_fatal("usage: ", argv[0], " cdefsrc_filename cdef_filename", 0, 1);
         compile.opt.cdefsrc = argv[optind];
         compile.opt.cdefname = argv[optind + 1];
         compile.run();

@@ -2,7 +2,7 @@
 // every other body out of line in a string table, arrays and structured
 // values element by element through anchors. Positions inside the string
 // table are kept as offsets, so growth of the table never loses a write.
-#include "qecfg.h"
+#include "qecfg_context.h"
 
 namespace {
 
@@ -22,13 +22,13 @@ template <typename T> void put_number(value_slot s, int type_out, T given) {
 
 } // namespace
 
-uint32_t qecfg_compiler::append_zero_body(tbl *st, size_t len) {
+uint32_t qecfg_context::append_zero_body(tbl *st, size_t len) {
     char *p = static_cast<char *>(alloc_tble(st, round8(len)));
     return uint32_t(p - st->tbl_base);
 }
 
 // A value of one of the types 2 to 9 into a field (or an array element).
-int qecfg_compiler::place_scalar(value_slot out, const zu_value_t *in, zu_data_type_t type, int type_out, tbl *st,
+int qecfg_context::place_scalar(value_slot out, const zu_value_t *in, zu_data_type_t type, int type_out, tbl *st,
                                  bool element) {
     bool given = type_out == TYPE_SAME;
     if (given && !in && type != ZU_RSRC_HANDLE_PTR)
@@ -74,24 +74,24 @@ int qecfg_compiler::place_scalar(value_slot out, const zu_value_t *in, zu_data_t
     }
 }
 
-int qecfg_compiler::copy_this_type(value_slot out_data, const zu_value_t *in_data, zu_data_type_t type_in,
-                                   int type_out, tbl *str_tbl, anchor *array_anchor, uint32_t array_cnt) {
+int qecfg_context::copy_this_type(value_slot out_data, const zu_value_t *in_data, zu_data_type_t type_in,
+                                   int type_out, tbl *str_tbl, body_cursor *array_anchor, uint32_t array_cnt) {
     // Declared codes that no placement uses.
     if (type_out == TYPE_16 || type_out == TYPE_INIT)
         return -1;
     switch (type_in) {
     case ZU_NONE: return 0;
     case ZU_SD_PTR:
-        qecfg_error_exit_rtn("copy_this_type: this function does not handle SD type", nullptr, nullptr, 0, 1);
-    case ZU_SBS_PTR: qecfg_error_exit_rtn("ZU_SBS_TYPE not supported", nullptr, nullptr, 0, 1);
+        raise_fatal("copy_this_type: this function does not handle SD type", nullptr, nullptr, 0, 1);
+    case ZU_SBS_PTR: raise_fatal("ZU_SBS_TYPE not supported", nullptr, nullptr, 0, 1);
     case ZU_SD_PTR_ARRAY:
-        qecfg_error_exit_rtn("copy_this_type: this function does not handle SD ARRAY type", nullptr, nullptr, 0, 1);
+        raise_fatal("copy_this_type: this function does not handle SD ARRAY type", nullptr, nullptr, 0, 1);
     case ZU_RSRC_HANDLE_PTR: return place_scalar(out_data, nullptr, type_in, TYPE_SAME, str_tbl, false);
     default: break;
     }
     if (zu_is_array_type(type_in)) {
-        anchor local;
-        anchor *a = array_anchor ? array_anchor : &local;
+        body_cursor local;
+        body_cursor *a = array_anchor ? array_anchor : &local;
         uint32_t idx = 0;
         init_array(str_tbl, a, array_cnt, out_data, &idx);
         if (!valid_code(type_out))
@@ -104,13 +104,13 @@ int qecfg_compiler::copy_this_type(value_slot out_data, const zu_value_t *in_dat
     return place_scalar(out_data, in_data, type_in, type_out, str_tbl, false);
 }
 
-void qecfg_compiler::init_array(tbl *str_tbl, anchor *a, uint32_t array_cnt, value_slot out_data,
+void qecfg_context::init_array(tbl *str_tbl, body_cursor *a, uint32_t array_cnt, value_slot out_data,
                                 uint32_t *elem_idx) {
     if (array_cnt == 0)
-        qecfg_error_exit_rtn("Attempt to write NULL array", nullptr, nullptr, 0, 1);
+        raise_fatal("Attempt to write NULL array", nullptr, nullptr, 0, 1);
     if (!a->set) {
         uint32_t off = append_zero_body(str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
-        *a = anchor{true, off};
+        *a = body_cursor{true, off};
         put_offset(out_data, off);
     }
     char *count = str_tbl->tbl_base + a->off;
@@ -118,19 +118,19 @@ void qecfg_compiler::init_array(tbl *str_tbl, anchor *a, uint32_t array_cnt, val
     store<uint32_t>(count, *elem_idx + 1);
 }
 
-void qecfg_compiler::init_scalar_sd(tbl *str_tbl, anchor *a, uint32_t sd_cnt, value_slot out_data,
+void qecfg_context::init_scalar_sd(tbl *str_tbl, body_cursor *a, uint32_t sd_cnt, value_slot out_data,
                                     uint32_t *elem_idx) {
     if (sd_cnt == 0) {
         // A structured value without elements keeps room for one.
         uint32_t off = append_zero_body(str_tbl, ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE);
-        *a = anchor{true, off};
+        *a = body_cursor{true, off};
         put_offset(out_data, off);
         *elem_idx = 0;
         return;
     }
     if (!a->set) {
         uint32_t off = append_zero_body(str_tbl, ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * size_t(sd_cnt));
-        *a = anchor{true, off};
+        *a = body_cursor{true, off};
         put_offset(out_data, off);
     }
     char *count = str_tbl->tbl_base + a->off;
@@ -138,13 +138,13 @@ void qecfg_compiler::init_scalar_sd(tbl *str_tbl, anchor *a, uint32_t sd_cnt, va
     store<uint32_t>(count, *elem_idx + 1);
 }
 
-void qecfg_compiler::init_array_sd(tbl *str_tbl, anchor *array_anchor, anchor *sd_anchor, uint32_t array_cnt,
+void qecfg_context::init_array_sd(tbl *str_tbl, body_cursor *array_anchor, body_cursor *sd_anchor, uint32_t array_cnt,
                                    uint32_t sd_cnt, value_slot out_data, uint32_t *sd_elem_idx) {
     if (array_cnt == 0)
-        qecfg_error_exit_rtn("Attempt to write NULL array", nullptr, nullptr, 0, 1);
+        raise_fatal("Attempt to write NULL array", nullptr, nullptr, 0, 1);
     if (!array_anchor->set) {
         uint32_t off = append_zero_body(str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
-        *array_anchor = anchor{true, off};
+        *array_anchor = body_cursor{true, off};
         put_offset(out_data, off);
     }
     store<uint32_t>(str_tbl->tbl_base + array_anchor->off, 1);
@@ -152,8 +152,8 @@ void qecfg_compiler::init_array_sd(tbl *str_tbl, anchor *array_anchor, anchor *s
                    sd_elem_idx);
 }
 
-int qecfg_compiler::copy_this_sd_type(value_slot out_data, zu_data_type_t type_in, int type_out, tbl *str_tbl,
-                                      anchor *array_anchor, anchor *sd_array_anchor, anchor *sd_element_anchor,
+int qecfg_context::copy_this_sd_type(value_slot out_data, zu_data_type_t type_in, int type_out, tbl *str_tbl,
+                                      body_cursor *array_anchor, body_cursor *sd_array_anchor, body_cursor *sd_element_anchor,
                                       uint32_t array_cnt, zu_data_type_t sd_type) {
     uint32_t idx = 0;
     if (sd_type == ZU_SD_PTR)
@@ -161,7 +161,7 @@ int qecfg_compiler::copy_this_sd_type(value_slot out_data, zu_data_type_t type_i
     else if (sd_type == ZU_SD_PTR_ARRAY)
         init_array_sd(str_tbl, sd_array_anchor, sd_element_anchor, 1, array_cnt, out_data, &idx);
     else
-        qecfg_error_exit_rtn("copy_this_sd_type: only SD types allowed", nullptr, nullptr, 0, 1);
+        raise_fatal("copy_this_sd_type: only SD types allowed", nullptr, nullptr, 0, 1);
     if (array_cnt == 0)
         return 0;
     uint32_t element = sd_element_anchor->off + uint32_t(ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * idx);

@@ -1,5 +1,6 @@
 // The source reader: one pass over the source in pieces of at most 254
-// characters, comment removal, stanza framing and dispatch of statements.
+// characters, comment removal, stanza framing, and each statement checked
+// against its keyword row and handed to the open builder.
 #include <array>
 #include <cerrno>
 #include <cstdlib>
@@ -9,8 +10,8 @@
 
 namespace {
 
-constexpr size_t LINE_BUFFER = 256;
-constexpr size_t PIECE_MAX = 254; // what one read of LINE_BUFFER - 1 takes
+constexpr size_t PIECE_MAX = QECFG_PIECE_MAX;
+constexpr size_t LINE_BUFFER = PIECE_MAX + 2;
 
 // Hands out the pieces that fgets with a 255-byte size would return, each
 // NUL-terminated and writable. A piece that ends with its newline inside the
@@ -130,120 +131,156 @@ bool strip_comments(char *line) {
     return true;
 }
 
-} // namespace
-
-int qecfg_compiler::set_table_id(const char *name) const {
-    for (int i = 0; sc_tables[i].sc_name; i++)
-        if (sc_tables[i].sc_name[0] == name[0] && std::strcmp(sc_tables[i].sc_name, name) == 0)
+int find_stanza_type(const char *name) {
+    for (int i = 0; i < NUM_STANZA_TYPES; i++)
+        if (stanza_defs[i].name[0] == name[0] && std::strcmp(stanza_defs[i].name, name) == 0)
             return i;
     return -1;
 }
 
-namespace {
-
-// Which stanza types are structured-data ones, and of those which belong to
-// attributes, by the names of the types.
-struct stanza_kinds {
-    bool sd[NUM_STANZA_TYPES] = {}, attr_sd[NUM_STANZA_TYPES] = {};
-    stanza_kinds() {
-        for (int i = 0; i < NUM_STANZA_TYPES; i++) {
-            sd[i] = std::strstr(stanza_defs[i].name, "SDDefinition") != nullptr;
-            attr_sd[i] = std::strstr(stanza_defs[i].name, "AttrSDDefinition") != nullptr;
-        }
+// The required-before-optional and duplicate rules. The given rows change
+// before the value is converted; a value then refused ends the compile.
+void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyword_row &row, const char *name) {
+    if (row.optional) {
+        if (given.required != stanza_defs[stanza].required_mask)
+            c.statement_error("Optional attribute discovered before all required attributes have been defined", name);
+        if ((given.optional & row.bit) && !row.repeatable)
+            c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
+        given.optional |= row.bit;
+        return;
     }
-};
-const stanza_kinds kinds_of_stanzas;
+    if ((given.required & row.bit) && !row.repeatable)
+        c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
+    given.required |= row.bit;
+    if (c.opt.debugLevel > 1)
+        QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
+}
 
 } // namespace
 
-bool qecfg_compiler::is_SD_stanza(int table_id) {
-    return table_id >= 0 && table_id < NUM_STANZA_TYPES && kinds_of_stanzas.sd[table_id];
-}
-
-bool qecfg_compiler::is_attr_SD(int table_id) {
-    return table_id >= 0 && table_id < NUM_STANZA_TYPES && kinds_of_stanzas.attr_sd[table_id];
-}
-
-sd_type_t qecfg_compiler::SD_stanza_type(int table_id) {
-    switch (table_id) {
-    case ST_ONLINE_SD: return SD_TYPE_ONLINE;
-    case ST_OFFLINE_SD: return SD_TYPE_OFFLINE;
-    case ST_DEFINE_SD: return SD_TYPE_DEFINE;
-    case ST_UNDEFINE_SD: return SD_TYPE_UNDEFINE;
-    case ST_RESET_SD: return SD_TYPE_RESET;
-    case ST_ACTION_IN_SD: return SD_TYPE_ACT_IN;
-    case ST_ACTION_OUT_SD: return SD_TYPE_ACT_RESP;
-    case ST_PATTR_SD: return SD_TYPE_PATTR;
-    case ST_DATTR_SD: return SD_TYPE_DATTR;
-    default: return SD_TYPE_UNKNOWN;
-    }
-}
-
-void qecfg_compiler::cache_input_data(const char *filename) {
-    cdb_fp = std::fopen(filename, "r");
-    if (!cdb_fp) {
+void qecfg_compiler::read_source(const char *filename) {
+    source_fp = std::fopen(filename, "r");
+    if (!source_fp) {
         int e = errno;
-        qecfg_error_exit_rtn(filename, ": cannot open because: ", std::strerror(e), 0, e);
+        raise_fatal(filename, ": cannot open because: ", std::strerror(e), 0, e);
     }
-    piece_reader reader(cdb_fp);
-    int table_id = -1;
+    piece_reader reader(source_fp);
     int err = 0;
     while (char *line = reader.next(err)) {
         linenum++;
         if (!strip_comments(line))
             continue;
-        if (line[0] == ' ' || line[0] == '\t') {
-            if (table_id < 0)
-                statement_error("Attribute found but no table defined yet");
-            save_attr(line, table_id);
-            continue;
-        }
-        handle_header(line, table_id);
+        if (line[0] == ' ' || line[0] == '\t')
+            read_statement(line);
+        else
+            read_header(line);
     }
     // A read error is not the end of the input.
     if (err)
-        qecfg_error_exit_rtn(filename, ": cannot read because: ", std::strerror(err), 0, err);
-    std::fclose(cdb_fp);
-    cdb_fp = nullptr;
+        raise_fatal(filename, ": cannot read because: ", std::strerror(err), 0, err);
+    std::fclose(source_fp);
+    source_fp = nullptr;
 }
 
-void qecfg_compiler::handle_header(char *line, int &table_id) {
-    table_id = set_table_id(line);
-    if (table_id < 0)
+stanza_builder &qecfg_compiler::builder_of(int t) {
+    switch (t) {
+    case ST_CONTROL_DEFINITION:
+    case ST_RESOURCE_CLASS: return cls;
+    case ST_CLASS_TO_MANAGER_MAPPING: return map;
+    case ST_RESOURCE_VARIABLE_CLASS: return vclass;
+    case ST_CLASS_ACTION: return actions[0];
+    case ST_RESOURCE_ACTION: return actions[1];
+    default: return is_sd_stanza(t) ? static_cast<stanza_builder &>(sd) : attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+    }
+}
+
+// A header completes the open structured-data run and the open actions,
+// then starts its own builder, which completes the open record of its kind.
+// Records of other kinds stay open until the next stanza of their kind or
+// the end of the source.
+void qecfg_compiler::read_header(char *line) {
+    int t = find_stanza_type(line);
+    if (t < 0)
         statement_error("Invalid table name: ", line);
-    prev_scp = scp;
-    scp = &sc_tables[table_id];
-    curr_sd_scp = scp;
-    if (is_SD_stanza(table_id)) {
-        start_sd_header(table_id);
+    prev_stanza = stanza;
+    stanza = t;
+    if (is_sd_stanza(t)) {
+        sd.start_stanza(t, prev_stanza);
+        sd.given = given_rows{};
         return;
     }
-    if (cb_sd_def.sd_cb_ID)
-        cmplt_sd_tbl(prev_scp);
+    if (sd.pending())
+        sd.complete();
     complete_open_actions();
-    (this->*scp->sc_init_tbl)();
-    scp->req_mask = scp->opt_mask = 0;
-    drop_dflt(scp->dflt);
-    attr_dflt_val = max_sd_idx = nullptr;
-    curr_sd_tbl = nullptr;
+    start_stanza(t);
+    builder_of(t).given = given_rows{};
+    sd.link_attribute(nullptr);
 }
 
-// Empties a stanza's default list. A list of default values belongs to its
-// stanza alone and is spent once the record is completed, so its table is
-// kept for reuse; the element type lists of structured attributes are shared
-// with the structured-data stanzas and are left alone.
-void qecfg_compiler::drop_dflt(dflt_tbl &d) {
-    if (d.tbl && d.tbl->tbl_name == DEFAULT_VALUES_TBL) {
-        std::free(d.tbl->tbl_base);
-        *d.tbl = tbl{};
-        free_tbls.push_back(d.tbl);
+void qecfg_compiler::start_stanza(int t) {
+    switch (t) {
+    case ST_CONTROL_DEFINITION:
+        if (cls.open())
+            complete_class();
+        cls.start();
+        break;
+    case ST_RESOURCE_CLASS: break; // fills the class its ControlDefinition opened
+    case ST_CLASS_TO_MANAGER_MAPPING: map.start(); break;
+    case ST_RESOURCE_VARIABLE_CLASS: vclass.start(); break;
+    case ST_CLASS_ACTION: actions[0].start(); break;
+    case ST_RESOURCE_ACTION: actions[1].start(); break;
+    default: attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE].start(); break;
     }
-    d = dflt_tbl{};
 }
 
 void qecfg_compiler::complete_open_actions() {
-    if (cb_rsrc_action.ac_cb_ID)
-        cmplt_action_tbl();
-    if (cb_rsrc_actionC.ac_cb_ID)
-        cmplt_actionC_tbl();
+    for (action_builder *a : {&actions[1], &actions[0]})
+        if (a->open())
+            a->complete();
+}
+
+void qecfg_compiler::read_statement(char *il) {
+    if (stanza < 0)
+        statement_error("Attribute found but no table defined yet");
+    const stanza_def &def = stanza_defs[stanza];
+    char *name = il;
+    while (*name == ' ' || *name == '\t')
+        name++;
+    if (!*name)
+        return;
+    char *eq = std::strchr(name, '=');
+    if (!eq)
+        statement_error("Missing '=' after attribute name");
+    *eq = '\0';
+    char *value = eq + 1;
+    if (std::strcmp(value, "\"\"") == 0)
+        return;
+    value = strip_quotes(value);
+    if (!value)
+        statement_error("Unmatched double quotes for attribute: ", name);
+    if (std::strlen(value) > QECFG_MAX_VALUE_LEN)
+        statement_error("Attibute value exceeds maximum length: ", name);
+    const keyword_row *row = nullptr;
+    size_t name_len = size_t(eq - name);
+    for (int i = 0; i < def.num_rows && !row; i++)
+        if (row_name_len[stanza][i] == name_len && std::memcmp(def.rows[i].name, name, name_len) == 0)
+            row = &def.rows[i];
+    if (!row)
+        statement_error("Attribute name not defined in table (name/table): ", name, def.name);
+    if (!*value) {
+        QECFG_TRACE(*this, "In file %s: ", opt.cdefsrc.c_str());
+        statement_error("Missing attribute value: ", name);
+    }
+    if (opt.debugLevel > 1)
+        QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, name, value,
+                    int(std::strlen(value)));
+    stanza_builder &b = builder_of(stanza);
+    apply_row_rules(*this, b.given, stanza, *row, name);
+    b.store_statement(*row, value);
+    // A structured attribute owns the definition of the run that follows.
+    if (row->what == statement::data_type) {
+        attr_builder &a = attrs[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+        if (zu_is_sd_type(a.data_type()))
+            sd.link_attribute(&a);
+    }
 }

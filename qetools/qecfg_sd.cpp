@@ -1,127 +1,171 @@
 // Structured-data definitions: runs of element stanzas framed into one
 // definition in "ClassSDDefs", attached to their owner, and the structured
-// default value of an attribute built from the element types.
-#include "qecfg.h"
+// value of an attribute built from the element types.
+#include "qecfg_builders.h"
 
-cdb_ref_t *qecfg_compiler::sd_owner_field(int table_id) {
-    rsrc_class_t &c = cb_rsrc_class;
-    rsrc_action_t &a = cb_rsrc_actionC.ac_cb_ID ? cb_rsrc_actionC : cb_rsrc_action;
-    switch (SD_stanza_type(table_id)) {
-    case SD_TYPE_ONLINE: return &c.u_rc_online_input;
-    case SD_TYPE_OFFLINE: return &c.u_rc_offline_input;
-    case SD_TYPE_DEFINE: return &c.u_rc_def_input;
-    case SD_TYPE_UNDEFINE: return &c.u_rc_undef_input;
-    case SD_TYPE_RESET: return &c.u_rc_reset_input;
+namespace {
+
+// The rows an element must have had: ElementIndex, ValidValue and
+// ValueDisplayName are not required of it.
+uint32_t element_required_rows() {
+    static const uint32_t mask = [] {
+        uint32_t m = 0;
+        for (const char *name : {"ElementName", "Description", "DisplayName", "DataType"})
+            m |= row_named(ST_DEFINE_SD, name).bit;
+        return m;
+    }();
+    return mask;
+}
+
+} // namespace
+
+sd_run::sd_run(qecfg_context &c, class_builder &owner, action_builder (&actions)[2])
+    : stanza_builder(c, &owner.rec), owner(owner), actions(actions) {}
+
+// The owner field of a class or action kind: an action run belongs to the
+// open ClassAction, else to the ResourceAction.
+cdb_ref_t *sd_run::class_owner(int k) {
+    rsrc_class_t &cr = owner.rec;
+    rsrc_action_t &a = actions[0].open() ? actions[0].rec : actions[1].rec;
+    switch (stanza_defs[k].sd_kind) {
+    case SD_TYPE_ONLINE: return &cr.u_rc_online_input;
+    case SD_TYPE_OFFLINE: return &cr.u_rc_offline_input;
+    case SD_TYPE_DEFINE: return &cr.u_rc_def_input;
+    case SD_TYPE_UNDEFINE: return &cr.u_rc_undef_input;
+    case SD_TYPE_RESET: return &cr.u_rc_reset_input;
     case SD_TYPE_ACT_IN: return &a.u_ac_sd_input;
-    case SD_TYPE_ACT_RESP: return &a.u_ac_sd_resp;
-    default: return curr_sd_tbl; // set by the attribute's DataType statement
+    default: return &a.u_ac_sd_resp;
     }
 }
 
-void qecfg_compiler::start_sd_header(int table_id) {
-    srtable_ctrl *scp = &sc_tables[table_id];
-    bool attr_kind = is_attr_SD(table_id);
+// The header of an element stanza of kind k. A run of another kind ends
+// first; a new run begins a definition for its owner.
+void sd_run::start_stanza(int k, int prev_stanza) {
+    bool attr_kind = is_attr_sd_stanza(k);
     // Without a class there is no structured attribute either: an attribute
     // run is refused for its missing owner, as after a ResourceClass.
-    if (!cb_rsrc_class.rc_cb_ID)
-        statement_error(attr_kind ? "Incorrect attribute type preceding this SD definition"
-                                  : "No class for SD Definition");
+    if (!owner.open())
+        c.statement_error(attr_kind ? "Incorrect attribute type preceding this SD definition"
+                                    : "No class for SD Definition");
     bool completed = false;
-    if (prev_scp && std::strcmp(prev_scp->sc_name, scp->sc_name) != 0 && cb_sd_def.sd_cb_ID) {
-        cmplt_sd_tbl(prev_scp);
+    if (element_open && prev_stanza != k) {
+        complete();
         completed = true;
     }
-    if (!cb_sd_def.sd_cb_ID)
-        check_new_definition(table_id);
-    if (completed && !attr_kind) {
-        // The definition that follows no longer belongs to an attribute.
-        attr_dflt_val = max_sd_idx = nullptr;
-        curr_sd_tbl = nullptr;
-    }
-    if (attr_kind && attr_dflt_val && prev_scp)
-        scp->dflt = prev_scp->dflt;
-    if (!cb_sd_def.sd_cb_ID) {
-        if (attr_kind && !attr_dflt_val)
-            statement_error("Incorrect attribute type preceding this SD definition");
-        if (!curr_sd_tbl)
-            curr_sd_tbl = sd_owner_field(table_id);
-        store<uint32_t>(curr_sd_tbl, mk_sd_sec());
-        sd_num_elems = 0;
-        if (!attr_kind)
-            scp->dflt = dflt_tbl{};
-    }
-    init_sd_tbl();
-    scp->req_mask = scp->opt_mask = 0;
+    if (!element_open)
+        check_new_definition(k);
+    if (completed && !attr_kind)
+        attr = nullptr; // the definition that follows no longer belongs to it
+    if (!element_open)
+        begin_definition(k);
+    next_element();
 }
 
-// A definition starts: refuse owners that are missing, that still wait for
-// their own definition, or that already have one.
-void qecfg_compiler::check_new_definition(int table_id) {
-    bool attr_kind = is_attr_SD(table_id);
-    sd_type_t kind = SD_stanza_type(table_id);
-    bool action_kind = kind == SD_TYPE_ACT_IN || kind == SD_TYPE_ACT_RESP;
-    if (action_kind && !cb_rsrc_actionC.ac_cb_ID && !cb_rsrc_action.ac_cb_ID)
-        statement_error("No action for this SD definition");
-    bool attr_waiting = attr_dflt_val && curr_sd_tbl && load<uint32_t>(curr_sd_tbl) == CDB_NONE;
-    if (!attr_kind && attr_waiting)
-        statement_error("Expected an attribute SD definition for the preceding attribute");
-    if (attr_kind) {
-        if (attr_dflt_val && curr_sd_tbl && load<uint32_t>(curr_sd_tbl) != CDB_NONE)
-            statement_error("Only one SD definition allowed per attribute");
+// Refuses owners that are missing, that still wait for their own
+// definition, or that already have one.
+void sd_run::check_new_definition(int k) {
+    sd_type_t sk = stanza_defs[k].sd_kind;
+    if ((sk == SD_TYPE_ACT_IN || sk == SD_TYPE_ACT_RESP) && !actions[0].open() && !actions[1].open())
+        c.statement_error("No action for this SD definition");
+    bool attr_has_definition = attr && load<uint32_t>(&attr->sd_ref()) != CDB_NONE;
+    if (is_attr_sd_stanza(k)) {
+        if (attr_has_definition)
+            c.statement_error("Only one SD definition allowed per attribute");
         return;
     }
-    if (load<uint32_t>(sd_owner_field(table_id)) != CDB_NONE)
-        statement_error("Only one SD definition of this kind allowed");
+    if (attr && !attr_has_definition)
+        c.statement_error("Expected an attribute SD definition for the preceding attribute");
+    if (load<uint32_t>(class_owner(k)) != CDB_NONE)
+        c.statement_error("Only one SD definition of this kind allowed");
 }
 
-void qecfg_compiler::init_sd_tbl() {
-    if (!cb_rsrc_class.rc_cb_ID)
-        statement_error("No class for SD Definition");
-    if (cb_sd_def.sd_cb_ID)
+void sd_run::begin_definition(int k) {
+    bool attr_kind = is_attr_sd_stanza(k);
+    if (attr_kind && !attr)
+        c.statement_error("Incorrect attribute type preceding this SD definition");
+    cdb_ref_t *ref = attr_kind ? &attr->sd_ref() : class_owner(k);
+    def_off = owner.new_section(&rsrc_class_t::u_rc_sd_defs, sizeof(sd_def_t), SD_DEF_ID);
+    store<uint32_t>(ref, def_off);
+}
+
+void sd_run::next_element() {
+    if (element_open)
         append_pending_element();
-    cb_sd_def = sd_def_t{};
-    cb_sd_def.sd_cb_ID = SD_DEF_ID;
+    element = sd_field{};
+    element_open = true;
     vvdisp_tbl = nullptr;
-    sd_vv_found = 0;
+    element_valid_values = false;
 }
 
-void qecfg_compiler::append_pending_element() {
-    if (!sd_name_found || !sd_desc_found || !sd_disp_found || !sd_dt_found)
-        statement_error("Previous stanza incomplete");
-    sd_name_found = sd_desc_found = sd_disp_found = sd_dt_found = 0;
-    tbl *sdt = entry_tbl(sc_tables[ST_DEFINE_SD].sc_sd_tbl);
-    if (!sdt)
-        statement_error("No Class SD table for SD Definition");
-    uint32_t def = load<uint32_t>(curr_sd_tbl);
-    uint32_t count = load<uint32_t>(sdt->tbl_base + def + offsetof(sd_def_t, sd_count));
-    uint32_t field = def + offsetof(sd_def_t, sd_fields);
+// The first element goes into the room of the definition's header, later
+// ones behind it.
+void sd_run::append_pending_element() {
+    uint32_t required = element_required_rows();
+    if ((given.required & required) != required)
+        c.statement_error("Previous stanza incomplete");
+    tbl *sdt = class_table(&rsrc_class_t::u_rc_sd_defs);
+    uint32_t count = load<uint32_t>(sdt->tbl_base + def_off + offsetof(sd_def_t, sd_count));
+    uint32_t field = def_off + offsetof(sd_def_t, sd_fields);
     if (count != 0)
-        field = uint32_t(static_cast<char *>(alloc_tble(sdt, sizeof(sd_field))) - sdt->tbl_base);
-    sd_field el = cb_sd_def.sd_fields[0];
-    el.sd_action_id = 0xFFFF;
-    el.sd_valid_type = 1;
-    if (!sd_vv_found) {
-        el.u_sd_valid_vals = cdb_ref_t{};
-        el.u_sd_valid_vals.offset[0] = CDB_NONE;
-    }
-    sd_vv_found = 0;
+        field = uint32_t(static_cast<char *>(c.alloc_tble(sdt, sizeof(sd_field))) - sdt->tbl_base);
+    sd_field el = element;
+    el.sd_action_id = CDB_SD_ELEMENT_ACTION_ID;
+    el.sd_valid_type = CDB_SD_ELEMENT_VALID_TYPE;
+    if (!element_valid_values)
+        el.u_sd_valid_vals = none_ref();
+    element_valid_values = false;
     std::memcpy(sdt->tbl_base + field, &el, sizeof el);
-    store<uint32_t>(sdt->tbl_base + def + offsetof(sd_def_t, sd_count), count + 1);
+    store<uint32_t>(sdt->tbl_base + def_off + offsetof(sd_def_t, sd_count), count + 1);
 }
 
-void qecfg_compiler::cmplt_sd_tbl(srtable_ctrl *scp) {
-    if (!cb_rsrc_class.rc_cb_ID)
-        statement_error("No class for SD Definition");
-    init_sd_tbl();
-    int table_id = int(scp - sc_tables);
-    if (is_attr_SD(table_id) && attr_dflt_val && scp->dflt.tbl) {
-        zu_data_type_t dt = std::strcmp(scp->dflt.tbl->tbl_name, "ZU_SD_PTR") == 0 ? ZU_SD_PTR : ZU_SD_PTR_ARRAY;
-        scp->dflt.num_elems = sd_num_elems;
-        dump_dflt(entry_tbl(scp->sc_str_tbl), scp->dflt, value_slot::at(attr_dflt_val), dt);
+// The attribute a run belongs to is still open when the run ends: every
+// header completes the run before any attribute.
+void sd_run::complete() {
+    next_element();
+    if (attr) {
+        attr->build_structured_value();
+        attr->set_max_sd_idx(uint16_t(curr_sdeli));
     }
-    if (is_attr_SD(table_id) && max_sd_idx)
-        store<uint16_t>(max_sd_idx, uint16_t(curr_sdeli));
     curr_sdeli = -1;
     expected_sdeli = 0;
-    cb_sd_def.sd_cb_ID = 0;
+    element_open = false;
+}
+
+void sd_run::store_statement(const keyword_row &row, char *v) {
+    switch (row.what) {
+    case statement::element_index: store_element_index(v); break;
+    case statement::element_data_type: store_element_type(v); break;
+    case statement::element_valid_value:
+        if (!element_valid_values) {
+            element.u_sd_valid_vals = cdb_ref_t{};
+            element.u_sd_valid_vals.offset[0] =
+                owner.new_section(&rsrc_class_t::u_rc_valid_vals, sizeof(valid_values_t), VALID_VALUES_ID);
+            element_valid_values = true;
+        }
+        store_valid_value(element.u_sd_valid_vals.offset[0], zu_data_type_t(element.sd_field_type), v);
+        break;
+    case statement::element_default_value: c.statement_error("Sorry, default SD values are not yet supported");
+    default: stanza_builder::store_statement(row, v); break;
+    }
+}
+
+void sd_run::store_element_index(const char *v) {
+    zu_value_t val{};
+    if (c.str_to_zu(&val, ZU_UINT32, v) != 0)
+        c.statement_error("str_to_zu: Invalid data");
+    curr_sdeli = int(val.val_uint32);
+    if (curr_sdeli != expected_sdeli) {
+        QECFG_TRACE(c, "curr_sdel = %d, expected_sdeli = %d\n", curr_sdeli, expected_sdeli);
+        c.statement_error("ElementIndeces must be consecutive");
+    }
+    expected_sdeli = int(unsigned(curr_sdeli) + 1);
+}
+
+void sd_run::store_element_type(const char *v) {
+    zu_data_type_t type = strToZuDt(v);
+    if (zu_is_sd_type(type))
+        c.statement_error("SD elements cannot be of SD type");
+    element.sd_field_type = type;
+    if (attr)
+        attr->add_element_type(type);
 }

@@ -423,10 +423,7 @@ void swap_header(const swap_image &img) {
 // The checksum makes the XOR of all words of the file 0, which holds in
 // either byte order once it holds in one.
 void store_checksum(const swap_image &img, uint32_t length) {
-    uint32_t sum = load<uint32_t>(img.base + offsetof(qel_cdb_header_t, cdb_hdr_length));
-    const size_t end = 8 + size_t(length - 4) / 4 * 4;
-    for (size_t pos = 8; pos < end; pos += 4)
-        sum ^= load<uint32_t>(img.base + pos);
+    uint32_t sum = cdb_checksum(length, [&](size_t off) { return load<uint32_t>(img.base + off); });
     store<uint32_t>(img.base + offsetof(qel_cdb_header_t, cdb_hdr_checksum), sum);
 }
 

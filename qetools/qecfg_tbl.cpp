@@ -5,7 +5,7 @@
 #include <cstdlib>
 #include <new>
 
-#include "qecfg.h"
+#include "qecfg_context.h"
 
 namespace {
 constexpr size_t CHUNK = size_t(1) << 20;
@@ -14,7 +14,7 @@ constexpr size_t LARGE_TABLE = size_t(32) << 10;
 constexpr size_t LARGE_BLOCK = size_t(1) << 20;
 } // namespace
 
-void *qecfg_compiler::cfg_malloc(size_t s) {
+void *qecfg_context::cfg_malloc(size_t s) {
     size_t need = round8(s ? s : 1);
     if (need <= chunk_left) {
         void *p = chunk_next;
@@ -26,7 +26,7 @@ void *qecfg_compiler::cfg_malloc(size_t s) {
     void *p = std::calloc(1, block);
     if (!p) {
         int e = errno;
-        qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(e), nullptr, 0, e);
+        raise_fatal("cfg_malloc malloc failure: ", std::strerror(e), nullptr, 0, e);
     }
     owned_blocks.push_back(p);
     if (block == CHUNK) {
@@ -36,16 +36,9 @@ void *qecfg_compiler::cfg_malloc(size_t s) {
     return p;
 }
 
-tbl *qecfg_compiler::new_tbl(const char *name, size_t au) {
-    tbl *t;
-    if (!free_tbls.empty()) {
-        t = free_tbls.back();
-        free_tbls.pop_back();
-        *t = tbl{};
-    } else {
-        t = new (cfg_malloc(sizeof(tbl))) tbl{};
-        owned_tbls.push_back(t);
-    }
+tbl *qecfg_context::new_tbl(const char *name, size_t au) {
+    tbl *t = new (cfg_malloc(sizeof(tbl))) tbl{};
+    owned_tbls.push_back(t);
     t->tbl_au = au;
     t->tbl_name = name;
     return t;
@@ -73,7 +66,7 @@ static bool reserve_block(tbl *t, size_t need) {
     return true;
 }
 
-void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
+void *qecfg_context::alloc_tble(tbl *t, size_t s) {
     bool trace = opt.debugLevel > 2;
     if (trace)
         QECFG_TRACE(*this, "alloc_tble: %s, structure size: %d\n", t->tbl_name, int(s));
@@ -81,10 +74,10 @@ void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
         t->tbl_size = 0;
         if (!reserve_block(t, t->tbl_au)) {
             int e = errno;
-            qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
+            raise_fatal(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
         }
         t->tbl_size = t->tbl_au;
-        t->tbl_next = t->tbl_prev_base = t->tbl_base;
+        t->tbl_next = t->tbl_base;
         t->tbl_end = t->tbl_base + t->tbl_size;
         std::memset(t->tbl_base, 0, t->tbl_size);
         if (trace)
@@ -96,12 +89,10 @@ void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
         if (trace)
             std::fprintf(opt.trace_err, "alloc_tble: overflow by %d b. Adding %d b to %s\n", int(s), int(incr),
                          t->tbl_name);
-        char *old_base = t->tbl_base;
         if (!reserve_block(t, t->tbl_size + incr)) {
             int e = errno;
-            qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
+            raise_fatal(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
         }
-        t->tbl_prev_base = old_base;
         t->tbl_size += incr;
         t->tbl_end = t->tbl_base + t->tbl_size;
         std::memset(t->tbl_next, 0, t->tbl_end - t->tbl_next);
@@ -120,9 +111,18 @@ void memcpy_8_rounded(void *dst, const void *src, size_t len) {
     std::memset(static_cast<char *>(dst) + len, 0, round8(len) - len);
 }
 
-zu_uint32_t qecfg_compiler::save_tbl_val_round(tbl *tp, const void *val, size_t len) {
+zu_uint32_t qecfg_context::save_tbl_val_round(tbl *tp, const void *val, size_t len) {
     size_t rounded = round8(len);
     char *p = static_cast<char *>(alloc_tble(tp, rounded));
     memcpy_8_rounded(p, val, len);
     return zu_uint32_t(p - tp->tbl_base);
+}
+
+// Once a table's bytes are in the image, or a list is spent, its storage is
+// given back; the table keeps its name and unit.
+void qecfg_context::release_storage(tbl *t) {
+    if (!t || !t->tbl_base)
+        return;
+    std::free(t->tbl_base);
+    *t = tbl{nullptr, nullptr, 0, nullptr, t->tbl_au, t->tbl_name, 0};
 }

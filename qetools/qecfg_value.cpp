@@ -7,7 +7,7 @@
 #include <cstring>
 #include <limits>
 
-#include "qecfg.h"
+#include "qecfg_context.h"
 
 namespace {
 
@@ -156,11 +156,7 @@ int strToVar(const char *s, qel_variable_type_t *t) {
     return 1;
 }
 
-zu_data_type_t scalar_zu(zu_data_type_t dt) {
-    return is_zu_array(dt) ? static_cast<zu_data_type_t>(dt - (ZU_INT32_ARRAY - ZU_INT32)) : dt;
-}
-
-int is_zu_array(zu_data_type_t dt) { return zu_is_array_type(dt) ? 1 : 0; }
+zu_data_type_t scalar_zu(zu_data_type_t dt) { return zu_data_type_t(zu_element_type(dt)); }
 
 char *strip_quotes(char *s) {
     if (!s)
@@ -235,7 +231,7 @@ int oct_convert(const char *p, int type, char *out_buf) {
     return 0;
 }
 
-int qecfg_compiler::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in) {
+int qecfg_context::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in) {
     if (!str_in || *str_in == '\0')
         return -1;
     switch (scalar_zu(zu_type)) {
@@ -271,7 +267,7 @@ int qecfg_compiler::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const 
     }
 }
 
-void qecfg_compiler::set_props(uint32_t *dest, const props_t *props, int len, char *vnoq) {
+void qecfg_context::set_props(uint32_t *dest, const props_t *props, int len, char *vnoq) {
     if (!vnoq)
         return;
     char *save = nullptr;
@@ -281,7 +277,7 @@ void qecfg_compiler::set_props(uint32_t *dest, const props_t *props, int len, ch
             if (std::strcmp(name, props[i].s) == 0)
                 found = &props[i];
         if (!found)
-            qecfg_error_exit_rtn(name, ": invalid property", nullptr, 0, 1);
+            raise_fatal(name, ": invalid property", nullptr, 0, 1);
         *dest |= found->p;
     }
 }

@@ -52,7 +52,7 @@ class Place : public ::testing::Test {
     // A value field outside the table; bytes a placement must not write keep
     // this pattern.
     alignas(8) unsigned char field[8];
-    anchor a, sda, sde;
+    body_cursor a, sda, sde;
 
     void SetUp() override { std::memset(field, 0xA5, sizeof field); }
     string table() const { return st->tbl_base ? string(st->tbl_base, tbl_used(st)) : string(); }
@@ -70,7 +70,7 @@ class Place : public ::testing::Test {
         EXPECT_EQ(tbl_used(st), used);
     }
     uint32_t u32_at(uint32_t off) const { return load<uint32_t>(st->tbl_base + off); }
-    int place(const zu_value_t *in, zu_data_type_t t, int code, anchor *an = nullptr, uint32_t cnt = 1) {
+    int place(const zu_value_t *in, zu_data_type_t t, int code, body_cursor *an = nullptr, uint32_t cnt = 1) {
         return c.copy_this_type(value_slot::at(field), in, t, code, st, an, cnt);
     }
 };
@@ -401,7 +401,7 @@ class PlaceSd : public Place {
     // array anchor emptied before each element.
     void build(std::initializer_list<zu_data_type_t> types, int code, zu_data_type_t sd_type) {
         for (zu_data_type_t t : types) {
-            a = anchor{};
+            a = body_cursor{};
             ASSERT_EQ(c.copy_this_sd_type(value_slot::at(field), t, code, st, &a, &sda, &sde, uint32_t(types.size()),
                                           sd_type),
                       0)
@@ -454,7 +454,7 @@ TEST_F(PlaceSd, WithoutElementsTheValueHasRoomForOne) {
     EXPECT_EQ(table(), string(24, '\0'));
     EXPECT_EQ(field_bytes(), field_with(bits<uint32_t>(0)));
     Place::SetUp();
-    a = sda = sde = anchor{};
+    a = sda = sde = body_cursor{};
     EXPECT_EQ(c.copy_this_sd_type(value_slot::at(field), ZU_INT32, R_HI_DEFAULT, st, &a, &sda, &sde, 0,
                                   ZU_SD_PTR_ARRAY),
               0);
@@ -505,7 +505,7 @@ TEST_F(Place, ArrayFilledWhileTheTableGrowsKeepsEveryElement) {
 TEST_F(Place, StructuredValueBuiltWhileTheTableGrowsKeepsEveryElement) {
     const int n = 200; // 8 + 16 * 200 = 3208 bytes, then a 16 + 24-byte handle array per element
     for (int i = 0; i < n; i++) {
-        a = anchor{};
+        a = body_cursor{};
         ASSERT_EQ(c.copy_this_sd_type(value_slot::at(field), ZU_RSRC_HANDLE_PTR_ARRAY, DFLT_DEFAULT, st, &a, &sda,
                                       &sde, n, ZU_SD_PTR),
                   0);

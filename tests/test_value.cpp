@@ -279,9 +279,9 @@ TEST(ValueNames, ArrayTypesAndTheirElements) {
     for (auto &[dt, el] : scalar_of)
         EXPECT_EQ(scalar_zu(static_cast<zu_data_type_t>(dt)), el) << dt;
     for (uint32_t dt : {0u, 12u, 23u, 0xFFFFFFFFu})
-        EXPECT_EQ(is_zu_array(static_cast<zu_data_type_t>(dt)), 0) << dt;
+        EXPECT_FALSE(zu_is_array_type(dt)) << dt;
     for (uint32_t dt : {13u, 17u, 22u})
-        EXPECT_EQ(is_zu_array(static_cast<zu_data_type_t>(dt)), 1) << dt;
+        EXPECT_TRUE(zu_is_array_type(dt)) << dt;
 }
 
 // ------------------------------------------------------------ quotes
