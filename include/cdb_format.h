@@ -50,9 +50,7 @@ constexpr bool zu_is_numeric_type(uint32_t dt) { return dt >= ZU_INT32 && dt <= 
 constexpr bool zu_is_numeric_array(uint32_t dt) { return dt >= ZU_INT32_ARRAY && dt <= ZU_FLOAT64_ARRAY; }
 constexpr bool zu_is_sd_type(uint32_t dt) { return dt == ZU_SD_PTR || dt == ZU_SD_PTR_ARRAY; }
 // The element type of an array type; any other type is its own.
-constexpr uint32_t zu_element_type(uint32_t dt) {
-    return zu_is_array_type(dt) ? dt - (ZU_INT32_ARRAY - ZU_INT32) : dt;
-}
+constexpr uint32_t zu_element_type(uint32_t dt) { return zu_is_array_type(dt) ? dt - (ZU_INT32_ARRAY - ZU_INT32) : dt; }
 
 // The source reader takes at most this many characters per read (a longer
 // line continues as the next line), and a value holds at most this many.

@@ -69,15 +69,15 @@ void attr_builder::start() {
     if (dynamic_) {
         rec.d = rsrc_dattr_t{};
         rec.d.ra_cb_ID = kind_of(stanza).id;
-        rec.d.u_ra_variety_list.offset[0] = owner.new_section(&rsrc_class_t::u_rc_variety_lists,
-                                                              sizeof(variety_list_t), VARIETY_LIST_ID);
+        rec.d.u_ra_variety_list.offset[0] =
+            owner.new_section(&rsrc_class_t::u_rc_variety_lists, sizeof(variety_list_t), VARIETY_LIST_ID);
         rec.d.u_ra_express = rec.d.u_ra_vclass = rec.d.u_ra_rearm_expr = rec.d.u_ra_sd = none_ref();
         rec.d.ra_max_sd_idx = CDB_NO_SD_INDEX;
     } else {
         rec.p = rsrc_pattr_t{};
         rec.p.ra_cb_ID = kind_of(stanza).id;
-        rec.p.u_ra_variety_list.offset[0] = owner.new_section(&rsrc_class_t::u_rc_variety_lists,
-                                                              sizeof(variety_list_t), VARIETY_LIST_ID);
+        rec.p.u_ra_variety_list.offset[0] =
+            owner.new_section(&rsrc_class_t::u_rc_variety_lists, sizeof(variety_list_t), VARIETY_LIST_ID);
         rec.p.u_ra_sd = none_ref();
         rec.p.ra_max_sd_idx = CDB_NO_SD_INDEX;
     }
@@ -112,8 +112,8 @@ void attr_builder::store_statement(const keyword_row &row, char *v) {
 
 void attr_builder::store_valid_value_statement(char *target, char *v) {
     if (!valid_values_started) {
-        store<uint32_t>(target, owner.new_section(&rsrc_class_t::u_rc_valid_vals, sizeof(valid_values_t),
-                                                  VALID_VALUES_ID));
+        store<uint32_t>(target,
+                        owner.new_section(&rsrc_class_t::u_rc_valid_vals, sizeof(valid_values_t), VALID_VALUES_ID));
         valid_values_started = true;
     }
     store_valid_value(load<uint32_t>(target), data_type(), v);

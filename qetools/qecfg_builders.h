@@ -67,9 +67,9 @@ class class_builder : public stanza_builder {
     class_builder(qecfg_context &c, record_table &classes) : stanza_builder(c, &rec), classes(classes) {}
     rsrc_class_t rec{};
     bool open() const { return rec.rc_cb_ID != 0; }
-    void start();                 // a fresh class with its thirteen tables
-    void name_from_output();      // an unnamed class takes the output's name
-    void finish();                // the locator resolved, the record appended
+    void start();            // a fresh class with its thirteen tables
+    void name_from_output(); // an unnamed class takes the output's name
+    void finish();           // the locator resolved, the record appended
     uint32_t new_section(cdb_ref_t rsrc_class_t::*table, size_t size, uint32_t id);
     void store_statement(const keyword_row &row, char *value) override;
 
@@ -156,7 +156,7 @@ class attr_builder : public stanza_builder {
         rsrc_dattr_t d;
     } rec{};
     bool valid_values_started = false, range_given = false;
-    value_list values;       // DefaultValue or InitialValue statements
+    value_list values;        // DefaultValue or InitialValue statements
     value_list element_types; // of a structured attribute: one per element
 };
 
@@ -182,7 +182,7 @@ class sd_run : public stanza_builder {
     sd_run(qecfg_context &c, class_builder &owner, action_builder (&actions)[2]);
     bool pending() const { return element_open; } // an element is being read
     void start_stanza(int kind, int prev_stanza);
-    void complete();                              // the run ends
+    void complete(); // the run ends
     void link_attribute(attr_builder *a) { attr = a; }
     void store_statement(const keyword_row &row, char *value) override;
 
@@ -202,7 +202,7 @@ class sd_run : public stanza_builder {
     attr_builder *attr = nullptr; // the structured attribute the run belongs to
     sd_field element{};
     bool element_open = false, element_valid_values = false;
-    uint32_t def_off = 0; // the definition in "ClassSDDefs"
+    uint32_t def_off = 0;                    // the definition in "ClassSDDefs"
     int curr_sdeli = -1, expected_sdeli = 0; // last ElementIndex, next expected
 };
 

@@ -7,8 +7,8 @@
 #include "cdb.h"
 #include "qecfg_keywords.h"
 
-#define ROW(rec, name, what, field, bit, optional, repeatable) \
-    {name, statement::what, uint16_t(offsetof(rec, field)), bit, optional, repeatable}
+#define ROW(rec, name, what, field, bit, optional, repeatable)                                                         \
+    { name, statement::what, uint16_t(offsetof(rec, field)), bit, optional, repeatable }
 constexpr bool REQ = false, OPT = true, ONCE = false, DUP = true;
 
 static const keyword_row control_definition_rows[] = {
@@ -109,8 +109,7 @@ static const keyword_row sd_rows[] = {
 
 template <size_t N> constexpr bool fits(const keyword_row (&)[N]) { return N <= MAX_ROWS_PER_STANZA; }
 static_assert(fits(control_definition_rows) && fits(cmmap_rows) && fits(variable_class_rows) &&
-              fits(resource_class_rows) && fits(pattr_rows) && fits(dattr_rows) && fits(action_rows) &&
-              fits(sd_rows));
+              fits(resource_class_rows) && fits(pattr_rows) && fits(dattr_rows) && fits(action_rows) && fits(sd_rows));
 
 #define ROWS(a) int(sizeof(a) / sizeof(a[0])), a
 

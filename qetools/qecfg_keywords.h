@@ -46,40 +46,40 @@ typedef enum {
 
 // What a statement does with its value.
 enum class statement : uint8_t {
-    number16,                   // a 16-bit number into the row's field
-    identifier,                 // a 32-bit number into the row's field
-    text,                       // a string table entry, its offset into the field
-    class_properties,           // property keywords of each record kind
+    number16,         // a 16-bit number into the row's field
+    identifier,       // a 32-bit number into the row's field
+    text,             // a string table entry, its offset into the field
+    class_properties, // property keywords of each record kind
     pattr_properties,
     dattr_properties,
     action_properties,
-    version,                    // a dotted version as one 32-bit number
-    permission_template,        // the field marked as given; the text is not kept
-    resource_manager,           // the name of the map's manager
-    locator,                    // the class's locator attribute, resolved at completion
-    variety_range,              // one low,high pair of the record's variety list
-    valid_value,                // one value (or low,high pair) of the valid values
-    default_value,              // one value of a persistent attribute's default
-    initial_value,              // the initial value of a dynamic attribute
-    value_display_name,         // the message id of the valid value given last
-    data_type,                  // the attribute's data type
-    variable_type,              // the dynamic attribute's variable type
-    range,                      // the low,high range of a dynamic attribute
-    list_action,                // accepted, nothing stored
-    permission,                 // the action's permission letter
-    element_index,              // checked only: indices run from 0 without gaps
-    element_data_type,          // the element's data type, never structured
-    element_valid_value,        // as valid_value, for the element
-    element_default_value,      // refused
+    version,               // a dotted version as one 32-bit number
+    permission_template,   // the field marked as given; the text is not kept
+    resource_manager,      // the name of the map's manager
+    locator,               // the class's locator attribute, resolved at completion
+    variety_range,         // one low,high pair of the record's variety list
+    valid_value,           // one value (or low,high pair) of the valid values
+    default_value,         // one value of a persistent attribute's default
+    initial_value,         // the initial value of a dynamic attribute
+    value_display_name,    // the message id of the valid value given last
+    data_type,             // the attribute's data type
+    variable_type,         // the dynamic attribute's variable type
+    range,                 // the low,high range of a dynamic attribute
+    list_action,           // accepted, nothing stored
+    permission,            // the action's permission letter
+    element_index,         // checked only: indices run from 0 without gaps
+    element_data_type,     // the element's data type, never structured
+    element_valid_value,   // as valid_value, for the element
+    element_default_value, // refused
 };
 
 // One keyword of a stanza type.
 struct keyword_row {
-    const char *name;   // compared exactly
+    const char *name; // compared exactly
     statement what;
-    uint16_t field;     // offset of the target field in the stanza's record
-    uint32_t bit;       // among the required, or among the optional, rows
-    bool optional;      // given only after every required row
+    uint16_t field; // offset of the target field in the stanza's record
+    uint32_t bit;   // among the required, or among the optional, rows
+    bool optional;  // given only after every required row
     bool repeatable;
 };
 

@@ -31,7 +31,9 @@ uint32_t next_list_entry(qecfg_context &c, tbl *t, uint32_t sec, size_t entry_si
     return uint32_t(p - t->tbl_base);
 }
 
-void count_entry(tbl *t, uint32_t count_off) { store<uint32_t>(t->tbl_base + count_off, load<uint32_t>(t->tbl_base + count_off) + 1); }
+void count_entry(tbl *t, uint32_t count_off) {
+    store<uint32_t>(t->tbl_base + count_off, load<uint32_t>(t->tbl_base + count_off) + 1);
+}
 
 } // namespace
 
@@ -56,8 +58,8 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
         static const struct {
             const props_t *props;
             int count;
-        } tables[] = {{rc_props, rc_props_cnt}, {pa_props, pa_props_cnt}, {da_props, da_props_cnt},
-                      {act_props, act_props_cnt}};
+        } tables[] = {
+            {rc_props, rc_props_cnt}, {pa_props, pa_props_cnt}, {da_props, da_props_cnt}, {act_props, act_props_cnt}};
         auto &k = tables[int(row.what) - int(statement::class_properties)];
         uint32_t w = load<uint32_t>(target);
         c.set_props(&w, k.props, k.count, v);
