@@ -32,7 +32,7 @@ TEST(Growth, EveryClassTableGrowsPastItsUnit) {
     compile_result r = compile_text(big_source(attrs, actions));
     ASSERT_EQ(r.message, "");
     const std::string &b = r.cdb;
-    const size_t cls = 128;
+    const size_t cls = CLASS;
     EXPECT_EQ(u16_at(b, cls + 168), attrs / 2); // class persistent attributes
     EXPECT_EQ(u16_at(b, cls + 172), attrs / 2); // resource persistent attributes
     EXPECT_EQ(u16_at(b, cls + 174), attrs);     // resource dynamic attributes
@@ -68,7 +68,7 @@ std::string class_attributes(int n) {
 TEST(Growth, ACountHoldsAtMost65535Records) {
     compile_result full = compile_text(class_attributes(65535));
     ASSERT_EQ(full.message, "");
-    EXPECT_EQ(u16_at(full.cdb, 128 + 168), 65535);
+    EXPECT_EQ(u16_at(full.cdb, CLASS + offsetof(rsrc_class_t, rc_num_pattrsC)), 65535);
     compile_result over = compile_text(class_attributes(65536));
     EXPECT_EQ(over.message, "Too many records in table: ClassPattrsC\n");
     EXPECT_EQ(over.code, 1);

@@ -6,21 +6,13 @@
 
 namespace {
 
-// With no variable class the class dsect is the first, at 80 + 3 * 16.
-constexpr size_t CLASS = 128;
-
-std::string class_string(const std::string &cdb, size_t ref_field) {
-    size_t strings = CLASS + u32_at(cdb, CLASS + 160);
-    return std::string(cdb.c_str() + strings + u32_at(cdb, CLASS + ref_field));
-}
-
 // The class name stored when the class's Name statement line reads `line`.
 std::string class_name_with(const std::string &line) {
     std::string src = BASE_SOURCE;
     src.replace(src.find("    Name=Test.Class\n"), 20, line + "\n");
     compile_result r = compile_text(src);
     EXPECT_EQ(r.message, "");
-    return r.has_output ? class_string(r.cdb, 8) : "";
+    return r.has_output ? class_string_at(r.cdb, u32_at(r.cdb, CLASS + offsetof(rsrc_class_t, u_rc_name))) : "";
 }
 
 TEST(Reader, CommentAndBlankLinesAreIgnored) {

@@ -6,17 +6,12 @@
 
 namespace {
 
-constexpr size_t CLASS = 128;       // the first dsect when there is no variable class
-constexpr size_t FIRST = CLASS + 224; // the first record behind the class record
+constexpr size_t FIRST = CLASS + sizeof(rsrc_class_t); // the first record behind the class record
 
 std::string pattr(const std::string &extra_required, const std::string &optional = "") {
     return BASE_SOURCE + "PersistentResourceAttribute\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=1\n"
                          "    DataType=Int32\n    VarietyRange=1,1\n" +
            extra_required + optional;
-}
-
-std::string string_at(const std::string &cdb, uint32_t off) {
-    return std::string(cdb.c_str() + CLASS + u32_at(cdb, CLASS + 160) + off);
 }
 
 // The attribute name that a Name statement with this text stores.
@@ -25,7 +20,7 @@ std::string stored_name(const std::string &statement) {
     src.replace(src.find("Name=a"), 6, statement);
     compile_result r = compile_text(src);
     EXPECT_EQ(r.message, "");
-    return r.has_output ? string_at(r.cdb, u32_at(r.cdb, FIRST + 8)) : "";
+    return r.has_output ? class_string_at(r.cdb, u32_at(r.cdb, FIRST + 8)) : "";
 }
 
 TEST(Statement, ValueSyntax) {

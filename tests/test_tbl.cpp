@@ -1,113 +1,74 @@
-// Growable tables: allocation units, growth in whole units, the exact-fit
-// rule, zero fill, rounded appends, and the allocation traces.
+// Growable tables, seen through what they report: the offsets of appends and
+// the allocation traces of -d 3 (first unit, growth in whole units, the
+// exact-fit rule).
 #include <gtest/gtest.h>
 
 #include "compile_support.h"
 
 namespace {
 
-struct TblTest : ::testing::Test {
+struct traced_compile {
     captured_stream out, err;
-    qecfg_compiler c{[this] {
+    qecfg_compiler c;
+    explicit traced_compile(int level) : c([&] {
         qecfg_options o;
+        o.debugLevel = level;
         o.trace_out = out.file();
         o.trace_err = err.file();
         return o;
-    }()};
+    }()) {}
 };
 
-TEST_F(TblTest, FirstAllocationMakesOneUnit) {
-    tbl *t = c.new_tbl("T", 32);
-    char *p = static_cast<char *>(c.alloc_tble(t, 0));
-    EXPECT_EQ(p, t->tbl_base);
-    EXPECT_EQ(t->tbl_next, t->tbl_base);
-    EXPECT_EQ(t->tbl_size, 32u);
-    EXPECT_EQ(t->tbl_end, t->tbl_base + 32);
+TEST(Tbl, GrowthInWholeUnitsIsTraced) {
+    struct step {
+        size_t size;
+        const char *out, *err;
+    };
+    const step steps[] = {
+        {0, "alloc_tble: T, structure size: 0\nalloc_tble: T, table size: 32\n", ""},
+        {24, "alloc_tble: T, structure size: 24\n", ""},
+        // 24 + 8 reaches the end: an exact fit grows too.
+        {8, "alloc_tble: T, structure size: 8\nalloc_tble: T, new table size: 64\n",
+         "alloc_tble: overflow by 8 b. Adding 32 b to T\n"},
+        // Sized from the request alone: 100 bytes take four 32-byte units.
+        {100, "alloc_tble: T, structure size: 100\nalloc_tble: T, new table size: 192\n",
+         "alloc_tble: overflow by 100 b. Adding 128 b to T\n"},
+        {0, "alloc_tble: T, structure size: 0\n", ""},
+    };
+    traced_compile t(3);
+    tbl *table = t.c.new_tbl("T", 32);
+    std::string out, err;
+    for (const step &s : steps) {
+        t.c.alloc_tble(table, s.size);
+        out += s.out;
+        err += s.err;
+        EXPECT_EQ(t.out.text(), out) << s.size;
+        EXPECT_EQ(t.err.text(), err) << s.size;
+    }
+    EXPECT_EQ(tbl_used(table), 132u);
 }
 
-TEST_F(TblTest, ExactFitGrowsByOneUnitFirst) {
-    tbl *t = c.new_tbl("T", 32);
-    c.alloc_tble(t, 24);
-    char *p = static_cast<char *>(c.alloc_tble(t, 8));
-    EXPECT_EQ(t->tbl_size, 64u);
-    EXPECT_EQ(p - t->tbl_base, 24);
-    EXPECT_EQ(tbl_used(t), 32u);
-}
-
-TEST_F(TblTest, LargeRequestGrowsByEnoughWholeUnits) {
-    tbl *t = c.new_tbl("T", 32);
-    c.alloc_tble(t, 8);
-    c.alloc_tble(t, 100);
-    EXPECT_EQ(t->tbl_size, 32u + 128u);
-    c.alloc_tble(t, 0); // 108 used of 160: no growth
-    EXPECT_EQ(t->tbl_size, 160u);
-}
-
-TEST_F(TblTest, FreeBytesAreZeroAndContentsSurviveGrowth) {
-    tbl *t = c.new_tbl("T", 16);
-    uint32_t a = c.add_to_tbl(t, "abc", 4);
+TEST(Tbl, AppendsAreRoundedToEightAndZeroPadded) {
+    traced_compile t(2); // below 3 nothing is traced
+    tbl *table = t.c.new_tbl("T", 16);
+    EXPECT_EQ(t.c.add_to_tbl(table, "x", 1), 0u);
+    EXPECT_EQ(t.c.add_to_tbl(table, "12345678", 8), 8u);
+    EXPECT_EQ(t.c.add_to_tbl(table, "123456789", 9), 16u);
+    EXPECT_EQ(t.c.add_to_tbl(table, "", 0), 32u);
     for (int i = 0; i < 100; i++)
-        c.add_to_tbl(t, "0123456789", 10);
-    EXPECT_STREQ(t->tbl_base + a, "abc");
-    for (char *p = t->tbl_next; p < t->tbl_end; p++)
+        t.c.add_to_tbl(table, "0123456789", 10);
+    EXPECT_EQ(std::memcmp(table->tbl_base, "x\0\0\0\0\0\0\0", 8), 0);
+    EXPECT_EQ(std::memcmp(table->tbl_base + 32 + 16 * 99, "0123456789\0\0\0\0\0\0", 16), 0);
+    for (const char *p = table->tbl_next; p < table->tbl_end; p++)
         ASSERT_EQ(*p, 0);
-    // Each 10-byte append takes 16 bytes, the last 6 of them zero.
-    EXPECT_EQ(std::memcmp(t->tbl_base + 8 + 16 * 99, "0123456789\0\0\0\0\0\0", 16), 0);
+    EXPECT_EQ(t.out.text() + t.err.text(), "");
 }
 
-TEST_F(TblTest, RoundedAppendSizes) {
-    tbl *t = c.new_tbl("T", 64);
-    EXPECT_EQ(c.add_to_tbl(t, "x", 1), 0u);
-    EXPECT_EQ(c.add_to_tbl(t, "12345678", 8), 8u);
-    EXPECT_EQ(c.add_to_tbl(t, "123456789", 9), 16u);
-    EXPECT_EQ(c.add_to_tbl(t, "", 0), 32u);
-    EXPECT_EQ(tbl_used(t), 32u);
-    EXPECT_EQ(std::memcmp(t->tbl_base, "x\0\0\0\0\0\0\0", 8), 0);
-}
-
-TEST_F(TblTest, RecordAppendsAreNotRounded) {
-    tbl *t = c.new_tbl("ResourceCMMaps", 480);
-    EXPECT_EQ(static_cast<char *>(c.alloc_tble(t, 60)) - t->tbl_base, 0);
-    EXPECT_EQ(static_cast<char *>(c.alloc_tble(t, 60)) - t->tbl_base, 60);
-}
-
-TEST(TblTrace, LevelThreePrintsAllocationsAndGrowth) {
-    captured_stream out, err;
-    qecfg_options o;
-    o.debugLevel = 3;
-    o.trace_out = out.file();
-    o.trace_err = err.file();
-    qecfg_compiler c(o);
-    tbl *t = c.new_tbl("Names", 16);
-    c.alloc_tble(t, 8);
-    c.alloc_tble(t, 8);
-    EXPECT_EQ(out.text(), "alloc_tble: Names, structure size: 8\n"
-                          "alloc_tble: Names, table size: 16\n"
-                          "alloc_tble: Names, structure size: 8\n"
-                          "alloc_tble: Names, new table size: 32\n");
-    EXPECT_EQ(err.text(), "alloc_tble: overflow by 8 b. Adding 16 b to Names\n");
-}
-
-TEST(TblTrace, LevelTwoPrintsNoAllocation) {
-    captured_stream out, err;
-    qecfg_options o;
-    o.debugLevel = 2;
-    o.trace_out = out.file();
-    o.trace_err = err.file();
-    qecfg_compiler c(o);
-    c.alloc_tble(c.new_tbl("Names", 16), 32);
-    EXPECT_EQ(out.text(), "");
-    EXPECT_EQ(err.text(), "");
-}
-
-TEST(MemcpyRounded, PadsToEightWithZeros) {
-    char dst[16];
-    std::memset(dst, 'z', sizeof dst);
-    memcpy_8_rounded(dst, "abcdefghij", 10);
-    EXPECT_EQ(std::memcmp(dst, "abcdefghij\0\0\0\0\0\0", 16), 0);
-    std::memset(dst, 'z', sizeof dst);
-    memcpy_8_rounded(dst, "abcdefgh", 8);
-    EXPECT_EQ(dst[8], 'z');
+TEST(Tbl, RecordAppendsAreNotRounded) {
+    traced_compile t(0);
+    tbl *table = t.c.new_tbl("ResourceCMMaps", 480);
+    EXPECT_EQ(static_cast<char *>(t.c.alloc_tble(table, 60)) - table->tbl_base, 0);
+    EXPECT_EQ(static_cast<char *>(t.c.alloc_tble(table, 60)) - table->tbl_base, 60);
 }
 
 } // namespace
