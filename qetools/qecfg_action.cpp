@@ -21,7 +21,7 @@ void action_builder::start() {
 void action_builder::complete() {
     if (given.required != stanza_defs[stanza].required_mask)
         c.statement_error("Previous stanza incomplete");
-    if (!given.has(row_named(stanza, "Permission")))
+    if (!given.has(row_named(stanza, kw::Permission)))
         rec.ac_perms = CDB_DEFAULT_PERMISSION;
     tbl *table = class_table(stanza == ST_CLASS_ACTION ? &rsrc_class_t::u_rc_actionsC : &rsrc_class_t::u_rc_actions);
     std::memcpy(c.alloc_tble(table, sizeof rec), &rec, sizeof rec);

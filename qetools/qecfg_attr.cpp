@@ -188,7 +188,7 @@ void attr_builder::complete() {
         complete_range();
     complete_value();
     if (dynamic_) {
-        if (!given.has(row_named(stanza, "GroupID")))
+        if (!given.has(row_named(stanza, kw::GroupID)))
             rec.d.ra_group_id = CDB_DEFAULT_GROUP_ID;
     } else if (!(rec.p.ra_props & (CDB_PA_REQD_FOR_DEFINE | CDB_PA_OPT_FOR_DEFINE))) {
         rec.p.ra_props |= CDB_PA_INVAL_FOR_DEFINE;

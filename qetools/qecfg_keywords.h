@@ -5,29 +5,7 @@
 
 #include <cstdint>
 
-// Stanza types, in the order the header lookup tries them.
-enum stanza_type {
-    ST_CONTROL_DEFINITION,
-    ST_CLASS_TO_MANAGER_MAPPING,
-    ST_RESOURCE_VARIABLE_CLASS,
-    ST_RESOURCE_CLASS,
-    ST_PERSISTENT_RESOURCE_ATTRIBUTE,
-    ST_PERSISTENT_CLASS_ATTRIBUTE,
-    ST_DYNAMIC_RESOURCE_ATTRIBUTE,
-    ST_DYNAMIC_CLASS_ATTRIBUTE,
-    ST_CLASS_ACTION,
-    ST_RESOURCE_ACTION,
-    ST_PATTR_SD,
-    ST_DATTR_SD,
-    ST_DEFINE_SD,
-    ST_UNDEFINE_SD,
-    ST_ONLINE_SD,
-    ST_OFFLINE_SD,
-    ST_RESET_SD,
-    ST_ACTION_IN_SD,
-    ST_ACTION_OUT_SD,
-    NUM_STANZA_TYPES
-};
+#include "qecfg_language.h"
 
 // The kind of a structured-data stanza: whose input, response or value its
 // definition describes.

@@ -10,7 +10,7 @@ namespace {
 uint32_t element_required_rows() {
     static const uint32_t mask = [] {
         uint32_t m = 0;
-        for (const char *name : {"ElementName", "Description", "DisplayName", "DataType"})
+        for (const char *name : {kw::ElementName, kw::Description, kw::DisplayName, kw::DataType})
             m |= row_named(ST_DEFINE_SD, name).bit;
         return m;
     }();
