@@ -59,15 +59,17 @@ qecfg_compiler::~qecfg_compiler() {
 void qecfg_compiler::finish_open_records() {
     if (sd.pending())
         sd.complete();
-    for (int k : {ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE, ST_PERSISTENT_CLASS_ATTRIBUTE,
-                  ST_DYNAMIC_CLASS_ATTRIBUTE}) {
+    complete_open_attributes({ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE,
+                              ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE});
+    complete_open_actions();
+}
+
+void qecfg_compiler::complete_open_attributes(std::initializer_list<int> order) {
+    for (int k : order) {
         attr_builder &a = attrs[k - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
         if (a.open())
             a.complete();
     }
-    for (action_builder *a : {&actions[1], &actions[0]})
-        if (a->open())
-            a->complete();
 }
 
 // A class completed at the next ControlDefinition takes its name first and
@@ -78,12 +80,8 @@ void qecfg_compiler::finish_open_records() {
 void qecfg_compiler::complete_class() {
     if (cls.rec.u_rc_name.offset[0] == CDB_NONE)
         cls.name_from_output();
-    for (int k : {ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE, ST_PERSISTENT_RESOURCE_ATTRIBUTE,
-                  ST_DYNAMIC_RESOURCE_ATTRIBUTE}) {
-        attr_builder &a = attrs[k - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
-        if (a.open())
-            a.complete();
-    }
+    complete_open_attributes({ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE,
+                              ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE});
     cls.finish();
 }
 

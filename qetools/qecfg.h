@@ -12,6 +12,7 @@
 #define QECFG_H
 
 #include <cstdio>
+#include <initializer_list>
 #include <set>
 #include <string>
 #include <unordered_map>
@@ -43,6 +44,7 @@ class qecfg_compiler : public qecfg_context {
     void start_stanza(int stanza);
     void complete_open_actions();
     void finish_open_records();
+    void complete_open_attributes(std::initializer_list<int> order);
     void complete_class();
     void build_manager();
 
