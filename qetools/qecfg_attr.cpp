@@ -124,7 +124,7 @@ void attr_builder::store_default(const char *v) {
     zu_data_type_t dt = data_type();
     if (zu_is_sd_type(dt))
         c.statement_error("Default values not expected; place default values in individual *SDDef stanzas.");
-    char *slot = static_cast<char *>(c.alloc_tble(&values.t, sizeof(zu_value_t)));
+    char *slot = values.take(c);
     zu_value_t val{};
     if (c.str_to_zu(&val, dt, v) != 0)
         c.statement_error("str_to_zu: Invalid data");
@@ -152,9 +152,7 @@ void attr_builder::store_range(char *target, char *v) {
     place_pair(dt, v, value_slot::at(target), value_slot::at(target + sizeof(zu_value_t)));
 }
 
-void attr_builder::add_element_type(zu_data_type_t type) {
-    store<uint32_t>(c.alloc_tble(&element_types.t, sizeof(zu_value_t)), type);
-}
+void attr_builder::add_element_type(zu_data_type_t type) { store(element_types.take(c), type); }
 
 // Each element gets the default of its type; an array-typed element an
 // array of its own.
@@ -164,9 +162,8 @@ void attr_builder::build_structured_value() {
     int code = dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT;
     for (uint32_t i = 0; i < n; i++) {
         array = body_cursor{};
-        zu_data_type_t et = load<zu_data_type_t>(element_types.t.tbl_base + i * sizeof(zu_value_t));
-        if (c.copy_this_sd_type(value_field(), et, code, strings(), &array, &sd_array, &sd_element, n, data_type()) !=
-            0)
+        if (c.copy_this_sd_type(value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
+                                data_type()) != 0)
             c.statement_error(dynamic_ ? "dump_dflt: copy_this_sd_type init error"
                                        : "dump_dflt: copy_this_sd_type default error");
     }

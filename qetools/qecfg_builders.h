@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "qecfg_context.h"
+#include "qecfg_keywords.h"
 
 // The records of the whole source, one table per kind.
 struct record_table {
@@ -54,12 +55,17 @@ class stanza_builder {
     uint32_t vvdisp_off = 0;
 };
 
-// An 8-byte slot per item in a table of its own, whose growth traces like
-// any table's: the default or initial values of an attribute.
-struct value_list {
+// Items of one type, an 8-byte slot each, in a table of its own whose growth
+// traces like any table's: the default values of an attribute, or the
+// element types of a structured attribute.
+template <typename T> struct slot_list {
+    static_assert(sizeof(T) <= 8);
+    static constexpr size_t SLOT = 8;
     tbl t;
-    size_t size() const { return tbl_used(&t) / sizeof(zu_value_t); }
-    zu_value_t at(size_t i) const { return load<zu_value_t>(t.tbl_base + i * sizeof(zu_value_t)); }
+    size_t size() const { return tbl_used(&t) / SLOT; }
+    T at(size_t i) const { return load<T>(t.tbl_base + i * SLOT); }
+    // The next slot, zero-filled; valid until the next one is taken.
+    char *take(qecfg_context &c) { return static_cast<char *>(c.alloc_tble(&t, SLOT)); }
 };
 
 class class_builder : public stanza_builder {
@@ -156,8 +162,8 @@ class attr_builder : public stanza_builder {
         rsrc_dattr_t d;
     } rec{};
     bool valid_values_started = false, range_given = false;
-    value_list values;        // DefaultValue or InitialValue statements
-    value_list element_types; // of a structured attribute: one per element
+    slot_list<zu_value_t> values;            // DefaultValue or InitialValue statements
+    slot_list<zu_data_type_t> element_types; // of a structured attribute: one per element
 };
 
 class action_builder : public stanza_builder {

@@ -7,7 +7,6 @@
 #include <string>
 #include <vector>
 
-#include "qecfg_keywords.h"
 #include "qecfg_tbl.h"
 
 // Every fatal condition of a compile becomes one of these; only main turns
