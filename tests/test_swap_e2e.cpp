@@ -32,7 +32,7 @@ class SwapE2E : public ::testing::TestWithParam<std::string> {};
 TEST_P(SwapE2E, ReversedImageMatchesThePlainOne) {
     std::string src = e2e::read_file(GetParam());
     compile_result plain = compile_text(src);
-    compile_result swapped = compile_text(src, [](qecfg_options &o) { o.swap_endianness = 1; });
+    compile_result swapped = compile_text(src, [](qecfg::options &o) { o.reverse_byte_order = true; });
     ASSERT_EQ(plain.message, "");
     ASSERT_EQ(swapped.message, "");
     const std::string &a = plain.cdb, &b = swapped.cdb;
