@@ -13,7 +13,8 @@ namespace {
 std::vector<fs::path> all_sources() {
     std::vector<fs::path> v;
     for (const auto &e : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples"))
-        v.push_back(e.path());
+        if (e.path().extension() == ".src")
+            v.push_back(e.path());
     for (const auto &d : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "tests" / "e2e"))
         if (fs::exists(d.path() / "input.src"))
             v.push_back(d.path() / "input.src");

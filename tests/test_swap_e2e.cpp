@@ -14,7 +14,8 @@ namespace {
 std::vector<std::string> compiling_sources() {
     std::vector<std::string> v;
     for (const auto &e : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples"))
-        v.push_back(e.path().string());
+        if (e.path().extension() == ".src")
+            v.push_back(e.path().string());
     for (const auto &d : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "tests" / "e2e"))
         if (fs::exists(d.path() / "input.src") && !fs::exists(d.path() / "status") && !fs::exists(d.path() / "args"))
             v.push_back((d.path() / "input.src").string());
