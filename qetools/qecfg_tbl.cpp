@@ -11,7 +11,7 @@ namespace {
 constexpr size_t CHUNK = size_t(1) << 20;
 constexpr size_t OWN_BLOCK = CHUNK / 16; // larger requests get a block of their own
 constexpr size_t MIN_BLOCK = 16;
-constexpr size_t LARGE_TABLE = size_t(512) << 10;
+constexpr size_t LARGE_TABLE = size_t(32) << 10;
 constexpr size_t LARGE_BLOCK = size_t(1) << 20;
 } // namespace
 
