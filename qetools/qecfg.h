@@ -33,9 +33,9 @@ struct tbl {
     size_t tbl_size = 0; // the size in whole allocation units, as the traces report it
     size_t tbl_au = 0;
     const char *tbl_name = nullptr;
-    // Room actually reserved behind tbl_base, zero-filled past tbl_next: what
-    // is used, grown geometrically so that a table of any size is copied a
-    // bounded number of times and never holds more than twice what it uses.
+    // Room actually reserved behind tbl_base: what is used, grown
+    // geometrically so that a table of any size is copied a bounded number
+    // of times; room past tbl_next is not touched until it is handed out.
     size_t tbl_cap = 0;
 };
 

@@ -94,7 +94,7 @@ void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
         QECFG_TRACE(*this, "alloc_tble: %s, structure size: %d\n", t->tbl_name, int(s));
     if (!t->tbl_base) {
         t->tbl_size = 0;
-        if (!reserve_block(t, s)) {
+        if (!reserve_block(t, std::max<size_t>(s, 1))) { // a table always has a block
             int e = errno;
             qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
         }
