@@ -56,6 +56,18 @@ inline void unprivileged() {
         _exit(126);
 }
 
+// Starts the qecfg binary in a directory on input.src into out.cdef.
+inline pid_t start_qecfg(const fs::path &dir) {
+    pid_t pid = fork();
+    if (pid == 0) {
+        if (chdir(dir.c_str()) != 0)
+            _exit(127);
+        execl(QECFG_BIN, "qecfg", "input.src", "out.cdef", static_cast<char *>(nullptr));
+        _exit(127);
+    }
+    return pid;
+}
+
 struct OutputDir : ::testing::Test {
     fs::path work;
     void SetUp() override {

@@ -83,16 +83,9 @@ TEST(Growth, ACountHoldsAtMost65535Records) {
 struct PeakMemory : output_test::OutputDir {
     long peak_kb(const std::string &source) {
         write("input.src", source);
-        pid_t pid = fork();
-        if (pid == 0) {
-            if (chdir(work.c_str()) != 0)
-                _exit(127);
-            execl(QECFG_BIN, "qecfg", "input.src", "out.cdef", static_cast<char *>(nullptr));
-            _exit(127);
-        }
         int status = 0;
         struct rusage ru {};
-        wait4(pid, &status, 0, &ru);
+        wait4(output_test::start_qecfg(work), &status, 0, &ru);
         EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
         return ru.ru_maxrss;
     }

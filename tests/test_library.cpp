@@ -10,18 +10,6 @@ namespace fs = std::filesystem;
 
 namespace {
 
-std::vector<fs::path> all_sources() {
-    std::vector<fs::path> v;
-    for (const auto &e : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples"))
-        if (e.path().extension() == ".src")
-            v.push_back(e.path());
-    for (const auto &d : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "tests" / "e2e"))
-        if (fs::exists(d.path() / "input.src"))
-            v.push_back(d.path() / "input.src");
-    std::sort(v.begin(), v.end());
-    return v;
-}
-
 struct outcome {
     int status;
     std::string message, image, out, err;
@@ -52,7 +40,7 @@ TEST_P(Library, FileAndMemorySinksAgree) {
     opt.reverse_byte_order = GetParam() == 1;
     opt.trace_level = GetParam() == 2 ? 3 : 0;
     const std::string out = (work / "out.cdef").string();
-    for (const fs::path &src : all_sources()) {
+    for (const fs::path &src : e2e::all_sources()) {
         SCOPED_TRACE(src.string());
         outcome to_file = traced(opt, [&](const qecfg::options &o, std::string &image) {
             fs::remove(out);

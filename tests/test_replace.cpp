@@ -132,13 +132,7 @@ struct Interrupt : Replace, ::testing::WithParamInterface<int> {};
 // Starts the compile, waits until its temporary file is there, then sends
 // the signal. False when the compile had finished first.
 bool signal_mid_write(const fs::path &work, int sig, int &status) {
-    pid_t pid = fork();
-    if (pid == 0) {
-        if (chdir(work.c_str()) != 0)
-            _exit(127);
-        execl(QECFG_BIN, "qecfg", "input.src", "out.cdef", static_cast<char *>(nullptr));
-        _exit(127);
-    }
+    pid_t pid = start_qecfg(work);
     for (;;) {
         if (waitpid(pid, &status, WNOHANG) == pid)
             return false;
