@@ -43,6 +43,12 @@ TEST_F(OutputFault, EachFailureLeavesTheDirectoryAsItWas) {
          "Cannot create CDB file: Is a directory\n"},
         {"read-only directory", [](OutputFault &t) { fs::permissions(t.work, fs::perms(0555)); }, "new.cdef",
          unprivileged, "Cannot create CDB file: Permission denied\n"},
+        {"output not writable",
+         [](OutputFault &t) {
+             fs::permissions(t.work, fs::perms(0777));
+             fs::permissions(t.work / "out.cdef", fs::perms(0444));
+         },
+         "out.cdef", unprivileged, "Cannot create CDB file: Permission denied\n"},
         {"FIFO", [](OutputFault &t) { ASSERT_EQ(mkfifo((t.work / "f.cdef").c_str(), 0600), 0); }, "f.cdef", {},
          "Cannot map CDB file: Invalid argument\n"},
         {"output is the source", {}, "input.src", {}, "Cannot create CDB file: Output is the source file\n"},
