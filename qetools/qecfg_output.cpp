@@ -175,7 +175,8 @@ void file_sink::open_output() {
     if (exists && faccessat(AT_FDCWD, target_.c_str(), W_OK, AT_EACCESS) != 0)
         fail(CREATE, errno);
     replaces_ = exists;
-    old_ = st;
+    if (replaces_)
+        old_ = st;
     int err = create_temporary();
     if (err == EACCES || err == EPERM || err == EROFS)
         return open_in_place();
