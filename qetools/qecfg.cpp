@@ -5,6 +5,7 @@
 #include <new>
 
 #include "qecfg.h"
+#include "qecfg_sink.h"
 
 qecfg_context::~qecfg_context() {
     if (source_fp)
@@ -44,7 +45,7 @@ qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opt
 }
 
 qecfg_compiler::~qecfg_compiler() {
-    release_output(false);
+    release_output();
     for (record_table *r : {&classes, &maps, &managers, &var_classes})
         std::free(r->t.tbl_base);
     // The lists of the builders are tables of their own.
@@ -103,7 +104,7 @@ void qecfg_compiler::run() {
         compile();
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
-        release_output(true);
+        release_output();
         raise_fatal("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
     }
 }

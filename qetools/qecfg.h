@@ -13,6 +13,7 @@
 
 #include <cstdio>
 #include <initializer_list>
+#include <memory>
 #include <set>
 #include <string>
 #include <unordered_map>
@@ -29,10 +30,10 @@ class qecfg_compiler : public qecfg_context {
     // The compile: read the source, complete everything, build the CDB.
     void run();
 
-    record_table classes{{nullptr, nullptr, 0, nullptr, 3584, "ResourceClasses", 0}};
-    record_table maps{{nullptr, nullptr, 0, nullptr, 480, "ResourceCMMaps", 0}};
-    record_table managers{{nullptr, nullptr, 0, nullptr, 192, "ResourceManagers", 0}};
-    record_table var_classes{{nullptr, nullptr, 0, nullptr, 320, "ResourceVariableClasses", 0}};
+    record_table classes{{nullptr, nullptr, 0, 3584, "ResourceClasses", 0}};
+    record_table maps{{nullptr, nullptr, 0, 480, "ResourceCMMaps", 0}};
+    record_table managers{{nullptr, nullptr, 0, 192, "ResourceManagers", 0}};
+    record_table var_classes{{nullptr, nullptr, 0, 320, "ResourceVariableClasses", 0}};
 
   private:
     void compile();
@@ -75,12 +76,12 @@ class qecfg_compiler : public qecfg_context {
 
     // the image
     [[noreturn]] void raise_output_fatal(const char *msg, const char *v1, const char *v2, int code);
-    [[noreturn]] void output_error(const char *msg, int err);
     void bld_cdb();
     size_t cdb_size();
     uint64_t class_dsect_size(rsrc_class_t *rc);
-    void release_output(bool remove_file);
-    char *get_mapfile(size_t cdb_file_size);
+    void release_output();
+    [[noreturn]] void output_failed(const struct sink_failure &f);
+    char *acquire_image(size_t cdb_file_size);
     void begin_dsect(cdb_dsect_type_t type);
     char *copy_record(cdb_dsect_type_t type, const char *src, size_t size);
     void grow_dsect(size_t len);
@@ -90,15 +91,14 @@ class qecfg_compiler : public qecfg_context {
     void add_rsrc_mgr_tbls();
     void add_rsrc_cmmap_tbls();
     void add_rsrc_var_class_tbls();
-    void flush_mapfile();
+    void commit_image();
     char *chp = nullptr; // the image's start
     char *dsp = nullptr; // where the next dsect's bytes go
     uint32_t dsect_count = 0, dsect_idx = 0;
     uint16_t hdr_max_class_id = 0, hdr_max_rm_id = 0;
-    int cdb_mapfile_fd = -1;
-    void *cdb_mapfile_ptr = nullptr;
-    size_t gross_file_size = 0;
-    bool output_created = false, output_regular = false;
+    image_sink *sink = nullptr;
+    std::unique_ptr<image_sink> own_sink; // the file sink, when none is given
+    bool image_pending = false;           // acquired, neither committed nor abandoned
 };
 
 // The byte-order reversal of a finished image, in place. Records named in

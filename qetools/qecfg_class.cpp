@@ -59,6 +59,8 @@ void class_builder::name_from_output() {
 
 void class_builder::finish() {
     resolve_locator();
+    for (const class_table_def &d : class_tables)
+        c.release_if_empty(rec.*d.field);
     classes.append(c, rec);
     rec.rc_cb_ID = 0;
 }

@@ -5,6 +5,7 @@
 
 #include <cstdio>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "qecfg_tbl.h"
@@ -24,6 +25,11 @@ struct qecfg_options {
     std::string cdefname;
     FILE *trace_out = stdout; // traces
     FILE *trace_err = stderr; // the table growth trace
+    // A source held in memory (cdefsrc is then only its name).
+    bool source_in_memory = false;
+    std::string_view source_text;
+    // Where the image goes; the file cdefname when null.
+    class image_sink *sink = nullptr;
 };
 
 // How copy_this_type places a value: the given one, or a default.
@@ -71,6 +77,7 @@ class qecfg_context {
     zu_uint32_t save_tbl_val_round(tbl *tp, const void *val, size_t len);
     zu_uint32_t add_to_tbl(tbl *tp, const void *data, size_t len) { return save_tbl_val_round(tp, data, len); }
     void release_storage(tbl *t);
+    void release_if_empty(cdb_ref_t &ref);
 
     // value text
     int str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in);
@@ -98,7 +105,11 @@ class qecfg_context {
     char *chunk_next = nullptr;
     size_t chunk_left = 0;
     std::vector<tbl *> owned_tbls;
+    std::vector<tbl *> free_tbls; // given back empty, for new_tbl to reuse
 };
+
+// A stream over a source held in memory.
+FILE *open_memory_source(std::string_view text);
 
 // Trace output of a compile.
 #define QECFG_TRACE(c, ...) std::fprintf((c).opt.trace_out, __VA_ARGS__)

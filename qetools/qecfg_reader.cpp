@@ -159,7 +159,7 @@ void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyw
 } // namespace
 
 void qecfg_compiler::read_source(const char *filename) {
-    source_fp = std::fopen(filename, "r");
+    source_fp = opt.source_in_memory ? open_memory_source(opt.source_text) : std::fopen(filename, "r");
     if (!source_fp) {
         int e = errno;
         raise_fatal(filename, ": cannot open because: ", std::strerror(e), 0, e);

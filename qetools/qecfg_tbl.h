@@ -13,13 +13,12 @@
 struct tbl {
     char *tbl_base = nullptr;
     char *tbl_next = nullptr;
-    size_t tbl_size = 0;
-    char *tbl_end = nullptr;
+    size_t tbl_size = 0; // the size in whole allocation units, as the traces report it
     size_t tbl_au = 0;
     const char *tbl_name = nullptr;
-    // Room actually reserved behind tbl_base. It grows geometrically so that a
-    // table of any size is copied a bounded number of times; tbl_size keeps
-    // the growth in whole allocation units that the traces report.
+    // Room actually reserved behind tbl_base: what is used, grown
+    // geometrically so that a table of any size is copied a bounded number
+    // of times; room past tbl_next is not touched until it is handed out.
     size_t tbl_cap = 0;
 };
 

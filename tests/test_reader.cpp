@@ -72,12 +72,9 @@ TEST(Reader, UnterminatedLastLineIsRead) {
 
 TEST(Reader, LineNumbersPastTwoToTheThirtyOneArePrintedInFull) {
     // Reading 2^31 lines takes minutes; the count is started high instead.
-    namespace fs = std::filesystem;
-    fs::path src = fs::temp_directory_path() / ("qecfg-lines-" + std::to_string(getpid()) + ".src");
-    std::ofstream(src) << "\nBogus\n";
     qecfg_options opt;
-    opt.cdefsrc = src.string();
-    opt.cdefname = (fs::temp_directory_path() / "qecfg-lines-never-written.cdef").string();
+    opt.source_in_memory = true;
+    opt.source_text = "\nBogus\n";
     qecfg_compiler c(opt);
     c.linenum = (uint64_t(1) << 31) + 1;
     std::string message;
@@ -86,12 +83,11 @@ TEST(Reader, LineNumbersPastTwoToTheThirtyOneArePrintedInFull) {
     } catch (const qecfg_fatal &f) {
         message = f.message;
     }
-    fs::remove(src);
     EXPECT_EQ(message, "2147483651: Invalid table name: Bogus\n");
 }
 
 TEST(Driver, OptionalStatementsAddNoMaskTrace) {
-    compile_result r = compile_text(BASE_SOURCE, [](qecfg_options &o) { o.debugLevel = 2; });
+    compile_result r = compile_text(BASE_SOURCE, [](qecfg::options &o) { o.trace_level = 2; });
     EXPECT_NE(r.out.find("ResourceClass: found attr: \"Name\", value: \"Test.Class\",length: 10\n"
                          "ClassToManagerMapping"),
               std::string::npos);

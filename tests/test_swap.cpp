@@ -32,7 +32,7 @@ uint32_t foreign_xor(const unsigned char *b, size_t size) {
 
 TEST(Swap, ReversedImageKeepsItsLengthAnchorsAndChecksum) {
     compile_result plain = compile_text(rich_source());
-    compile_result swapped = compile_text(rich_source(), [](qecfg_options &o) { o.swap_endianness = 1; });
+    compile_result swapped = compile_text(rich_source(), [](qecfg::options &o) { o.reverse_byte_order = true; });
     ASSERT_EQ(plain.message, "");
     ASSERT_EQ(swapped.cdb.size(), plain.cdb.size());
     const auto *b = reinterpret_cast<const unsigned char *>(swapped.cdb.data());
