@@ -12,6 +12,12 @@ namespace cdbdump {
 node to_tree(const cdb_file &f);
 node value_node(const value &v);
 
+// The same document written while the dsects are read (verify_each): the
+// header and layout, then each dsect in anchor order, then the end.
+void begin_file(tree_writer &w, const cdb_file &f);
+void write_dsect(tree_writer &w, const dsect &d, const anchor &a);
+void end_file(tree_writer &w);
+
 } // namespace cdbdump
 
 #endif
