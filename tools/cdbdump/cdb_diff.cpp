@@ -19,10 +19,13 @@ const node *member(const node &n, const std::string &key) {
     return nullptr;
 }
 
-std::string item_name(const node &item) {
+std::string raw_name(const node &item) {
     const node *name = member(item, "name");
-    return name ? c_quote(name->text()) : "";
+    return name ? name->text() : "";
 }
+
+// A named item as a path segment.
+std::string item_name(const node &item) { return c_quote(raw_name(item)); }
 
 // Lists of named records: compared by name. The order of a structured-data
 // definition is its content; that of attributes and actions is not.
@@ -81,14 +84,14 @@ class differ {
                 changes.push_back(change{change::kind::removed, with(path, name), i, node::null(), false, ""});
                 continue;
             }
-            common_a.push(node::string(name));
+            common_a.push(node::string(raw_name(i)));
             compare(i, *found->second, with(path, name), "");
         }
         std::map<std::string, bool> in_a;
         for (const node &i : a.items()) in_a[item_name(i)] = true;
         for (const node &i : b.items()) {
             if (in_a.count(item_name(i))) {
-                common_b.push(node::string(item_name(i)));
+                common_b.push(node::string(raw_name(i)));
                 continue;
             }
             changes.push_back(change{change::kind::added, with(path, item_name(i)), node::null(), i, false, ""});
@@ -173,8 +176,12 @@ bool ids_kept(const node &before, const node &after) {
 }
 
 void judge_change(change &c) {
-    const std::string &field = c.path.back();
-    family f = owner(c.path, c.path.size() - 2);
+    // The member of the innermost named record (or of the dsect) that changed.
+    size_t record = 0;
+    for (size_t i = 1; i + 1 < c.path.size(); i++)
+        if (is_name(c.path[i])) record = i;
+    const std::string &field = c.path[std::min(record + 1, c.path.size() - 1)];
+    family f = owner(c.path, record);
     if (field == "class_id") return verdict(c, true, "the class id changed");
     if (field == "id" && f == family::attribute) return verdict(c, true, "an attribute id changed");
     if (field == "id" && f == family::action) return verdict(c, true, "an action id changed");
@@ -185,7 +192,12 @@ void judge_change(change &c) {
     if (field == "variable_ids")
         return ids_kept(c.before, c.after) ? verdict(c, false, "variable IDs were added")
                                            : verdict(c, true, "a variable ID moved");
-    verdict(c, false, "no stored value or call depends on it");
+    for (const char *text : {"description", "display_name", "group_name", "expression_description",
+                             "rearm_description", "range_description", "confirmation_message"})
+        if (field == text) return verdict(c, false, "a description or display name changed");
+    for (const char *value : {"default_value", "initial_value", "range", "valid_values"})
+        if (field == value) return verdict(c, false, "a default or range changed");
+    verdict(c, false, "nothing stored or called depends on it");
 }
 
 // The lists of a class an item left and joined tell what changed.
@@ -218,8 +230,11 @@ void pair_moves(std::vector<change> &changes) {
         }
     }
     size_t kept = 0;
-    for (size_t i = 0; i < changes.size(); i++)
-        if (!merged[i]) changes[kept++] = std::move(changes[i]);
+    for (size_t i = 0; i < changes.size(); i++) {
+        if (merged[i]) continue;
+        if (kept != i) changes[kept] = std::move(changes[i]);
+        kept++;
+    }
     changes.resize(kept);
 }
 
