@@ -449,7 +449,7 @@ annotation annotate_walk(const uint8_t *data, size_t size) {
 // keeps the spans that start in its window only, and walks only the dsects
 // that reach into it.
 size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each) {
-    constexpr size_t WINDOW = 1 << 18;
+    constexpr size_t WINDOW = 1 << 20;
     walker first(data, size, true);
     first.hand_spans_to([](std::vector<span> &&, size_t) {});
     first.hand_dsects_to([](size_t, dsect &&) {});
