@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <cstdio>
 #include <iterator>
+#include <optional>
 
 #include "cdb_text.h"
 
@@ -107,6 +108,18 @@ std::string annotation_text(const uint8_t *data, size_t size, const annotation &
     w.spans(std::vector<span>(a.spans), SIZE_MAX);
     w.finish(a.violations);
     return out.take();
+}
+
+size_t write_annotation(const uint8_t *data, size_t size, text_sink &out, size_t window) {
+    bool big = false;
+    std::optional<annotation_writer> w;
+    auto each = [&](std::vector<span> &&batch, size_t below) {
+        if (!w) w.emplace(data, size, big, out);
+        w->spans(std::move(batch), below);
+    };
+    size_t violations = annotate_each(data, size, big, each, window);
+    w->finish(violations);
+    return violations;
 }
 
 } // namespace cdbdump

@@ -31,6 +31,9 @@ class annotation_writer {
 // Lines of "offset  hex bytes  field = value"; ranges that nothing labels are
 // shown as padding (all zero) or as unreferenced bytes, violations as "!!".
 std::string annotation_text(const uint8_t *data, size_t size, const annotation &a);
+// The same listing written while the file is walked (annotate_each); returns
+// the number of violations.
+size_t write_annotation(const uint8_t *data, size_t size, text_sink &out, size_t window = ANNOTATE_WINDOW);
 
 } // namespace cdbdump
 

@@ -4,6 +4,7 @@
 
 #include "cdb_names.h"
 #include "cdb_text.h"
+#include "cdb_walk.h"
 
 namespace cdbdump {
 
@@ -253,6 +254,7 @@ node value_node(const value &v) {
     return node::null();
 }
 
+namespace {
 node file_head(const cdb_file &f) {
     node sizes = node::object();
     for (int i = 0; i < NUM_RECORD_SIZES; i++) sizes.add(record_size_names[i], node::uinteger(f.record_sizes[i]));
@@ -278,6 +280,7 @@ node file_head(const cdb_file &f) {
         .add("header", header)
         .add("layout", layout);
 }
+} // namespace
 
 node to_tree(const cdb_file &f) {
     node dsects = node::array();
@@ -285,6 +288,7 @@ node to_tree(const cdb_file &f) {
     return file_head(f).add("dsects", dsects);
 }
 
+namespace {
 void begin_file(tree_writer &w, const cdb_file &f) {
     w.begin_object();
     add_members(w, file_head(f));
@@ -312,6 +316,14 @@ void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
 void end_file(tree_writer &w) {
     w.end();
     w.end();
+}
+} // namespace
+
+void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out) {
+    tree_writer w(style, out);
+    begin_file(w, head);
+    verify_each(data, size, [&](size_t i, dsect &&d) { write_dsect(w, d, head.anchors[i]); });
+    end_file(w);
 }
 
 } // namespace cdbdump

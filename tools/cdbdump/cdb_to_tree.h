@@ -12,11 +12,9 @@ namespace cdbdump {
 node to_tree(const cdb_file &f);
 node value_node(const value &v);
 
-// The same document written while the dsects are read (verify_each): the
-// header and layout, then each dsect in anchor order, then the end.
-void begin_file(tree_writer &w, const cdb_file &f);
-void write_dsect(tree_writer &w, const dsect &d, const anchor &a);
-void end_file(tree_writer &w);
+// The whole document of a verified image, written while a walk reads the
+// dsects again, so that only one record's tree is ever held.
+void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out);
 
 } // namespace cdbdump
 

@@ -448,17 +448,16 @@ annotation annotate_walk(const uint8_t *data, size_t size) {
 // finds the largest ids, the file is listed window by window: each walk
 // keeps the spans that start in its window only, and walks only the dsects
 // that reach into it.
-size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each) {
-    constexpr size_t WINDOW = 1 << 20;
+size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each, size_t window) {
     walker first(data, size, true);
     first.hand_spans_to([](std::vector<span> &&, size_t) {});
     first.hand_dsects_to([](size_t, dsect &&) {});
     big_endian = first.run().big_endian;
     size_t violations = first.take_annotation().violations;
-    for (size_t start = 0; start < size || start == 0; start += WINDOW) {
+    for (size_t start = 0;; start += window) {
         walker w(data, size, true);
-        bool last = size - start <= WINDOW;
-        w.set_window(start, last ? SIZE_MAX : start + WINDOW);
+        bool last = size - start <= window;
+        w.set_window(start, last ? SIZE_MAX : start + window);
         w.know_maxima(first.maxima());
         w.hand_dsects_to([](size_t, dsect &&) {});
         w.hand_spans_to(each);

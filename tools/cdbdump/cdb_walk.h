@@ -58,9 +58,12 @@ struct dsect_maxima {
 };
 // Receives spans in batches: no later batch holds a span that starts below `final_below`.
 using span_consumer = std::function<void(std::vector<span> &&batch, size_t final_below)>;
-// The annotating walk, handing its spans over one dsect at a time; returns the
-// number of violations flagged.
-size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each);
+// The annotating walk, handing its spans over in file order, window by window
+// of `window` bytes, so that only the spans of one window are held; returns
+// the number of violations flagged.
+constexpr size_t ANNOTATE_WINDOW = 1 << 20;
+size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each,
+                     size_t window = ANNOTATE_WINDOW);
 
 } // namespace cdbdump
 

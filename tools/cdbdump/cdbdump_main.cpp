@@ -106,30 +106,10 @@ std::optional<int> load(input_file &in, const std::string &path, FILE *err) {
     }
 }
 
-// The text and JSON documents are written while a second walk reads the
-// dsects again, so that only one dsect's tree is ever held.
-void write_document(const input_file &in, const cdb_file &head, tree_writer::style style, text_sink &out) {
-    tree_writer w(style, out);
-    begin_file(w, head);
-    verify_each(in.data(), in.size(), [&](size_t i, dsect &&d) { write_dsect(w, d, head.anchors[i]); });
-    end_file(w);
-}
-
-int annotate(const input_file &in, text_sink &out) {
-    bool big = false;
-    std::optional<annotation_writer> w;
-    size_t violations = annotate_each(in.data(), in.size(), big, [&](std::vector<span> &&batch, size_t below) {
-        if (!w) w.emplace(in.data(), in.size(), big, out);
-        w->spans(std::move(batch), below);
-    });
-    w->finish(violations);
-    return violations ? 1 : 0;
-}
-
 int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
     input_file in;
     if (auto status = load(in, path, err)) return *status;
-    if (m == mode::annotate) return annotate(in, out);
+    if (m == mode::annotate) return write_annotation(in.data(), in.size(), out) ? 1 : 0;
     std::string name = display_name(path);
     try {
         if (m == mode::source) {
@@ -140,7 +120,7 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
         }
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
         if (m != mode::check)
-            write_document(in, head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
+            write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
     } catch (const cdb_invalid &e) {
         return report_invalid(err, name, e.offset, e.message, in);
     }
