@@ -24,8 +24,20 @@ std::string raw_name(const node &item) {
     return name ? name->text() : "";
 }
 
-// A named item as a path segment.
-std::string item_name(const node &item) { return c_quote(raw_name(item)); }
+// Keys made unique by their occurrence: a second "A" is "A" #2.
+std::vector<std::string> unique(std::vector<std::string> keys) {
+    std::map<std::string, int> seen;
+    for (std::string &k : keys)
+        if (int n = ++seen[k]; n > 1) k += " #" + std::to_string(n);
+    return keys;
+}
+
+// The named items of a list as path segments: quoted names, made unique.
+std::vector<std::string> item_keys(const node &list) {
+    std::vector<std::string> keys;
+    for (const node &i : list.items()) keys.push_back(c_quote(raw_name(i)));
+    return unique(keys);
+}
 
 // Lists of named records: compared by name. The order of a structured-data
 // definition is its content; that of attributes and actions is not.
@@ -74,27 +86,27 @@ class differ {
 
     // Named items matched by name; path ends with the list's key.
     void lists(const node &a, const node &b, const path_t &path, bool ordered) {
-        std::map<std::string, const node *> in_b;
-        for (const node &i : b.items()) in_b.emplace(item_name(i), &i);
+        std::vector<std::string> keys_a = item_keys(a), keys_b = item_keys(b);
+        std::map<std::string, size_t> in_a, in_b;
+        for (size_t i = 0; i < keys_a.size(); i++) in_a[keys_a[i]] = i;
+        for (size_t i = 0; i < keys_b.size(); i++) in_b[keys_b[i]] = i;
         node common_a = node::array(), common_b = node::array();
-        for (const node &i : a.items()) {
-            std::string name = item_name(i);
-            auto found = in_b.find(name);
+        for (size_t i = 0; i < keys_a.size(); i++) {
+            const node &item = a.items()[i];
+            auto found = in_b.find(keys_a[i]);
             if (found == in_b.end()) {
-                changes.push_back(change{change::kind::removed, with(path, name), i, node::null(), false, ""});
+                changes.push_back(change{change::kind::removed, with(path, keys_a[i]), item, node::null(), false, ""});
                 continue;
             }
-            common_a.push(node::string(raw_name(i)));
-            compare(i, *found->second, with(path, name), "");
+            common_a.push(node::string(raw_name(item)));
+            compare(item, b.items()[found->second], with(path, keys_a[i]), "");
         }
-        std::map<std::string, bool> in_a;
-        for (const node &i : a.items()) in_a[item_name(i)] = true;
-        for (const node &i : b.items()) {
-            if (in_a.count(item_name(i))) {
-                common_b.push(node::string(raw_name(i)));
-                continue;
-            }
-            changes.push_back(change{change::kind::added, with(path, item_name(i)), node::null(), i, false, ""});
+        for (size_t i = 0; i < keys_b.size(); i++) {
+            const node &item = b.items()[i];
+            if (in_a.count(keys_b[i]))
+                common_b.push(node::string(raw_name(item)));
+            else
+                changes.push_back(change{change::kind::added, with(path, keys_b[i]), node::null(), item, false, ""});
         }
         if (ordered && !same(common_a, common_b))
             changes.push_back(change{change::kind::reordered, path, common_a, common_b, false, ""});
@@ -117,10 +129,14 @@ node content(const cdb_file &f) {
     node header = *t.find("header");
     header.erase("timestamp");
     node c = node::object().add("header", header);
-    for (const node &d : t.find("dsects")->items()) {
-        node body = d;
+    const std::vector<node> &dsects = t.find("dsects")->items();
+    std::vector<std::string> keys;
+    for (const node &d : dsects) keys.push_back(dsect_key(d));
+    keys = unique(keys);
+    for (size_t i = 0; i < dsects.size(); i++) {
+        node body = dsects[i];
         body.erase("dsect");
-        c.add(dsect_key(d), body);
+        c.add(keys[i], body);
     }
     return c;
 }
