@@ -9,6 +9,8 @@
 
 #include <gtest/gtest.h>
 
+#include "test_dirs.h"
+
 namespace fs = std::filesystem;
 
 namespace {
@@ -17,21 +19,11 @@ struct run_result {
     std::string out;
 };
 
-std::string read_text(const fs::path &p) {
-    std::ifstream in(p);
-    std::stringstream s;
-    s << in.rdbuf();
-    return s.str();
-}
+using cdbtest::read_text;
 
-struct diff_dir {
-    fs::path path;
+struct diff_dir : cdbtest::work_dir {
     std::string base = read_text(fs::path(QECFG_SOURCE_DIR) / "tests/cdbdump/diff/base.src");
-    diff_dir() {
-        std::string tmpl = (fs::temp_directory_path() / "cdbdump_diff_XXXXXX").string();
-        path = mkdtemp(tmpl.data());
-    }
-    ~diff_dir() { fs::remove_all(path); }
+    diff_dir() : work_dir("cdbdump_diff") {}
 
     // Compiles the source text into NAME (with -s when swapped); the path.
     std::string compile(const std::string &source, const std::string &name, bool swapped = false) {

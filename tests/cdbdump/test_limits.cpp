@@ -8,9 +8,11 @@
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <vector>
 
 #include <gtest/gtest.h>
 
+#include "test_dirs.h"
 #include "test_images.h"
 
 namespace fs = std::filesystem;
@@ -22,24 +24,12 @@ struct run_result {
     long peak_kb;
 };
 
-struct work_dir {
-    fs::path path;
-    work_dir() {
-        std::string tmpl = (fs::temp_directory_path() / "cdbdump_limits_XXXXXX").string();
-        path = mkdtemp(tmpl.data());
-    }
-    ~work_dir() { fs::remove_all(path); }
-    std::string file(const std::string &name, const std::vector<uint8_t> &bytes) const {
-        std::ofstream(path / name, std::ios::binary).write(reinterpret_cast<const char *>(bytes.data()), long(bytes.size()));
-        return (path / name).string();
-    }
-};
+using cdbtest::read_text;
+using cdbtest::work_dir;
 
-std::string read_text(const fs::path &p) {
-    std::ifstream in(p);
-    std::stringstream s;
-    s << in.rdbuf();
-    return s.str();
+std::string write_file(const work_dir &w, const std::string &name, const std::vector<uint8_t> &bytes) {
+    std::ofstream(w.path / name, std::ios::binary).write(reinterpret_cast<const char *>(bytes.data()), long(bytes.size()));
+    return (w.path / name).string();
 }
 
 // Runs a shell command line in the work directory; its standard error, exit
@@ -132,7 +122,7 @@ TEST(Limits, MemoryExhaustionEndsWithAMessage) {
 
 TEST(Limits, OutputThatCannotBeWrittenIsAnError) {
     work_dir w;
-    std::string good = w.file("good.cdef", cdbtest::rich_image(false));
+    std::string good = write_file(w, "good.cdef", cdbtest::rich_image(false));
     // Every output is more than the 1 KB that the size limit leaves.
     const std::pair<const char *, const char *> sinks[] = {
         {"> /dev/full", "No space left on device"},
@@ -152,8 +142,8 @@ TEST(Limits, OutputThatCannotBeWrittenIsAnError) {
 
 TEST(Limits, InputRefusedBeforeItIsRead) {
     work_dir w;
-    std::string good = w.file("good.cdef", cdbtest::worked_example(false));
-    fs::resize_file(w.file("sparse.cdef", {}), (uint64_t(1) << 32) + 748);
+    std::string good = write_file(w, "good.cdef", cdbtest::worked_example(false));
+    fs::resize_file(write_file(w, "sparse.cdef", {}), (uint64_t(1) << 32) + 748);
     std::string length = std::to_string(fs::file_size(good) - 4);
     std::ofstream(w.path / "source.src") << large_source(1, 1);
     const std::pair<std::string, std::string> cases[] = {

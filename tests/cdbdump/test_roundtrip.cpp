@@ -13,6 +13,7 @@
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
 #include "cdb_walk.h"
+#include "test_dirs.h"
 #include "test_images.h"
 
 namespace fs = std::filesystem;
@@ -30,14 +31,7 @@ std::vector<fs::path> sources() {
     return found;
 }
 
-struct work_dir {
-    fs::path path;
-    work_dir() {
-        std::string tmpl = (fs::temp_directory_path() / "cdbdump_rt_XXXXXX").string();
-        path = mkdtemp(tmpl.data());
-    }
-    ~work_dir() { fs::remove_all(path); }
-};
+using cdbtest::work_dir;
 
 // Compiles in the work directory; the class name of an unnamed class then
 // comes from the same output name every time.
