@@ -106,7 +106,9 @@ void exercise(const std::vector<uint8_t> &b, bool print) {
         (void)decompile(f);
     } catch (const cdb_invalid &) {
     }
-    if (print) EXPECT_EQ(cdbtest::streamed_annotation(b, 48), annotation_text(b.data(), b.size(), a));
+    if (print) {
+        EXPECT_EQ(cdbtest::streamed_annotation(b, 700), annotation_text(b.data(), b.size(), a));
+    }
 }
 } // namespace
 

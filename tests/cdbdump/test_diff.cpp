@@ -142,7 +142,9 @@ TEST(Diff, EachCompatibleAndBreakingChangeInBothByteOrders) {
             EXPECT_EQ(line.substr(line.rfind(" (")), std::string(" (") + v.reason + ")") << line;
             // Without its verdict the line is one of --diff, which shows a move as a removal and an addition.
             std::string plain = line.substr(line.find(' ') + 1, line.rfind(" (") - line.find(' ') - 1);
-            if (plain.rfind("moved ", 0) != 0) EXPECT_NE(diff.out.find(plain + "\n"), std::string::npos) << plain;
+            if (plain.rfind("moved ", 0) != 0) {
+                EXPECT_NE(diff.out.find(plain + "\n"), std::string::npos) << plain;
+            }
         }
     }
 }

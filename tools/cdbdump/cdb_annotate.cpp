@@ -50,7 +50,7 @@ void gap(const uint8_t *data, size_t from, size_t to, std::string &out) {
         std::string label = zero ? "(padding)" : "(unreferenced bytes)";
         std::string text(reinterpret_cast<const char *>(data + from), end - from);
         if (!zero && std::all_of(text.begin(), text.end(), [](char c) { return c >= 0x20 && c < 0x7f; }))
-            label += " " + c_quote(text);
+            label.append(" ").append(c_quote(text));
         rows(data, from, end, label, out);
         from = end;
     }

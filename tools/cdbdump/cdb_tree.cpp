@@ -47,7 +47,7 @@ void json_into(const node &n, int indent, std::string &out) {
             out += flat ? (i ? " " : "") : "\n" + pad;
             json_into(n.items()[i], indent + 2, out);
         }
-        if (!flat && !n.items().empty()) out += "\n" + std::string(size_t(indent), ' ');
+        if (!flat && !n.items().empty()) out.append("\n").append(size_t(indent), ' ');
         out += "]";
         return;
     }
@@ -58,7 +58,7 @@ void json_into(const node &n, int indent, std::string &out) {
             out += pad + json_quote(n.members()[i].first) + ": ";
             json_into(n.members()[i].second, indent + 2, out);
         }
-        if (!n.members().empty()) out += "\n" + std::string(size_t(indent), ' ');
+        if (!n.members().empty()) out.append("\n").append(size_t(indent), ' ');
         out += "}";
         return;
     }

@@ -181,7 +181,9 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
             if (mm != mode::json) c.m = mm;
             continue;
         }
-        if (mode_given) return usage_error(err, "only one of --check, --json, --annotate and --source");
+        if (mode_given)
+            return usage_error(err, "only one of --check, --json, --annotate, --source, --diff and --compat "
+                                    "(--json may go with --diff or --compat)");
         c.m = mm;
         mode_given = true;
     }
