@@ -1,7 +1,9 @@
 #include "cdbdump_main.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <iterator>
 #include <new>
 #include <optional>
 #include <string>
