@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "cdb.h"
+#include "cdb_format.h"
 
 namespace cdbdump {
 
@@ -35,13 +35,13 @@ std::string var_type_name(uint32_t vt);
 // "class", "manager", "map", "variable_class", or "type N".
 std::string dsect_kind_name(uint32_t type);
 
-inline bool is_array_type(uint32_t dt) { return zu_is_array_type(dt); }
-inline uint32_t element_type(uint32_t dt) { return is_array_type(dt) ? dt - 11 : dt; }
-inline bool is_numeric_type(uint32_t dt) { return dt >= 2 && dt <= 7; }
 inline bool is_wide_type(uint32_t dt) { return dt == 4 || dt == 5 || dt == 7; }
-inline bool is_sd_type(uint32_t dt) { return dt == 11 || dt == 22; }
-// 100 in a numeric type (2 to 7): the high end of a range that no statement gave.
-inline uint64_t hundred_bits(uint32_t dt) { return dt == 6 ? 0x42c80000u : dt == 7 ? 0x4059000000000000ull : 100; }
+// The high end of a numeric range that no statement gave, as the bits of the
+// type (2 to 7).
+inline uint64_t hundred_bits(uint32_t dt) {
+    static_assert(CDB_DEFAULT_RANGE_HIGH == 100);
+    return dt == ZU_FLOAT32 ? 0x42c80000u : dt == ZU_FLOAT64 ? 0x4059000000000000ull : CDB_DEFAULT_RANGE_HIGH;
+}
 
 } // namespace cdbdump
 

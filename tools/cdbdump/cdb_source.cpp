@@ -5,7 +5,8 @@
 #include <algorithm>
 #include <map>
 
-#include "cdb.h"
+#include "cdb_format.h"
+#include "qecfg_language.h"
 #include "cdb_names.h"
 #include "cdb_source.h"
 #include "cdb_text.h"
@@ -13,10 +14,6 @@
 namespace cdbdump {
 
 namespace {
-constexpr uint32_t PERM_TEMPLATE_GIVEN = 0xEEEEEEEE; // what a permission template statement stores
-constexpr uint32_t DEFAULT_PERMISSION = 0x40;        // the letter 's', given to actions without Permission
-constexpr uint16_t NO_GROUP = 255;                   // the GroupID of a dynamic attribute without one
-constexpr uint16_t NO_INDEX = 0xFFFF;
 
 std::string n(uint64_t v) { return std::to_string(v); }
 
@@ -119,7 +116,7 @@ std::optional<std::string> decompiler::value_text(const value &v, const std::str
 // Classes
 
 std::optional<std::string> decompiler::locator_name(const class_dsect &c) {
-    if (c.locator == NO_INDEX) return std::nullopt;
+    if (c.locator == CDB_NO_LOCATOR) return std::nullopt;
     for (const pattr &p : c.pattrs) {
         if (uint16_t(p.id) != c.locator) continue;
         // The compiler takes the first persistent resource attribute of the given name.
@@ -131,23 +128,23 @@ std::optional<std::string> decompiler::locator_name(const class_dsect &c) {
 }
 
 void decompiler::resource_class(const class_dsect &c) {
-    w_.stanza("ResourceClass");
-    w_.stmt("Description", n(c.description_msgid));
-    w_.stmt("DisplayName", n(c.display_msgid));
+    w_.stanza(stanza_names[ST_RESOURCE_CLASS]);
+    w_.stmt(kw::Description, n(c.description_msgid));
+    w_.stmt(kw::DisplayName, n(c.display_msgid));
     if (unnamed_bits(class_props, c.props))
         w_.warn("class properties " + hex(c.props) + " have bits without a keyword");
     std::string props = props_text(class_props, c.props);
-    w_.stmt("Properties", props.empty() ? "," : props); // a list of no keyword sets nothing
+    w_.stmt(kw::Properties, props.empty() ? "," : props); // a list of no keyword sets nothing
     bool templates = true;
-    const std::pair<const char *, uint32_t> perm_templates[] = {{"ClassPermTemplate", c.perm_temp_class},
-                                                                {"ResourcePermTemplate", c.perm_temp}};
+    const std::pair<const char *, uint32_t> perm_templates[] = {{kw::ClassPermTemplate, c.perm_temp_class},
+                                                                {kw::ResourcePermTemplate, c.perm_temp}};
     for (const auto &[name, v] : perm_templates) {
-        if (v == PERM_TEMPLATE_GIVEN)
+        if (v == CDB_PERM_TEMPLATE_GIVEN)
             w_.stmt(name, "template");
         else if (v != 0)
             w_.warn(std::string(name) + " " + hex(v) + " cannot be given: a template statement stores " +
-                    hex(PERM_TEMPLATE_GIVEN));
-        templates = templates && v == PERM_TEMPLATE_GIVEN;
+                    hex(CDB_PERM_TEMPLATE_GIVEN));
+        templates = templates && v == CDB_PERM_TEMPLATE_GIVEN;
     }
     if (c.alias) w_.warn("class alias " + c_quote(*c.alias) + " cannot be given in source");
     if (c.class_id) w_.warn("class id " + n(c.class_id) + " cannot be given in source");
@@ -159,20 +156,20 @@ void decompiler::resource_class(const class_dsect &c) {
                 ".cdef");
         return;
     }
-    if (locator) w_.text("Locator", *locator);
-    w_.text("Name", c.name);
+    if (locator) w_.text(kw::Locator, *locator);
+    w_.text(kw::Name, c.name);
 }
 
 void decompiler::class_stanzas(const class_dsect &c) {
-    w_.stanza("ControlDefinition");
-    w_.stmt("FileVersion", version_text(c.version));
+    w_.stanza(stanza_names[ST_CONTROL_DEFINITION]);
+    w_.stmt(kw::FileVersion, version_text(c.version));
     resource_class(c);
     const std::pair<const char *, const std::optional<sd_definition> *> runs[] = {
-        {"DefineSDDefinition", &c.define_sd},
-        {"UndefineSDDefinition", &c.undefine_sd},
-        {"OnlineSDDefinition", &c.online_sd},
-        {"OfflineSDDefinition", &c.offline_sd},
-        {"ResetSDDefinition", &c.reset_sd}};
+        {stanza_names[ST_DEFINE_SD], &c.define_sd},
+        {stanza_names[ST_UNDEFINE_SD], &c.undefine_sd},
+        {stanza_names[ST_ONLINE_SD], &c.online_sd},
+        {stanza_names[ST_OFFLINE_SD], &c.offline_sd},
+        {stanza_names[ST_RESET_SD], &c.reset_sd}};
     for (const auto &[stanza, def] : runs)
         if (*def) sd_run(stanza, **def, true, true);
     for (const pattr &p : c.pattrs_class) pattr_stanza(p);
@@ -191,29 +188,29 @@ void decompiler::sd_run(const char *stanza, const sd_definition &def, bool index
     for (size_t i = 0; i < def.size(); i++) {
         const sd_element &e = def[i];
         w_.stanza(stanza);
-        w_.text("ElementName", e.name);
-        w_.stmt("Description", n(e.description_msgid));
-        w_.stmt("DisplayName", n(e.display_msgid));
-        if (indexes) w_.stmt("ElementIndex", n(i));
-        w_.stmt("DataType", data_type_name(e.type));
-        if (e.action_id != 0xFFFF || e.valid_type != 1)
+        w_.text(kw::ElementName, e.name);
+        w_.stmt(kw::Description, n(e.description_msgid));
+        w_.stmt(kw::DisplayName, n(e.display_msgid));
+        if (indexes) w_.stmt(kw::ElementIndex, n(i));
+        w_.stmt(kw::DataType, data_type_name(e.type));
+        if (e.action_id != CDB_SD_ELEMENT_ACTION_ID || e.valid_type != CDB_SD_ELEMENT_VALID_TYPE)
             w_.warn("element " + c_quote(e.name) + ": action id " + hex(e.action_id) + " and valid type " +
                     n(e.valid_type) + " cannot be given (the compiler writes 0xffff and 1)");
         if (e.vv && !(indexes && valid_values_allowed))
             w_.warn("element " + c_quote(e.name) + ": valid values cannot be given in this stanza");
         else
-            valid_value_stmts("ValidValue", e.vv);
+            valid_value_stmts(kw::ValidValue, e.vv);
     }
 }
 
 void decompiler::attr_sd_run(const char *stanza, const attr_common &a) {
     if (!a.sd) {
-        if (a.max_sd_idx != NO_INDEX)
+        if (a.max_sd_idx != CDB_NO_SD_INDEX)
             w_.warn(c_quote(a.name) + ": highest element index " + n(a.max_sd_idx) + " without a definition");
         return;
     }
     // The highest element index is the last ElementIndex given, or none without them.
-    bool indexes = a.max_sd_idx != NO_INDEX;
+    bool indexes = a.max_sd_idx != CDB_NO_SD_INDEX;
     if (indexes && a.max_sd_idx + size_t(1) != a.sd->size())
         w_.warn(c_quote(a.name) + ": highest element index " + n(a.max_sd_idx) + " does not match " + n(a.sd->size()) +
                 " elements");
@@ -224,23 +221,23 @@ void decompiler::attr_sd_run(const char *stanza, const attr_common &a) {
 // Attributes
 
 void decompiler::attr_required(const attr_common &a) {
-    w_.text("Name", a.name);
-    w_.stmt("Description", n(a.description_msgid));
-    w_.stmt("DisplayName", n(a.display_msgid));
-    w_.stmt("Id", std::to_string(a.id));
+    w_.text(kw::Name, a.name);
+    w_.stmt(kw::Description, n(a.description_msgid));
+    w_.stmt(kw::DisplayName, n(a.display_msgid));
+    w_.stmt(kw::Id, std::to_string(a.id));
     if (a.data_type == ZU_UNKNOWN || a.data_type == ZU_SBS_PTR)
         w_.warn(c_quote(a.name) + ": data type " + data_type_name(a.data_type) + " does not compile");
-    w_.stmt("DataType", data_type_name(a.data_type));
+    w_.stmt(kw::DataType, data_type_name(a.data_type));
     if (a.varieties.empty()) w_.warn(c_quote(a.name) + ": at least one VarietyRange is required");
-    for (const variety &v : a.varieties) w_.stmt("VarietyRange", n(v.low) + "," + n(v.high));
+    for (const variety &v : a.varieties) w_.stmt(kw::VarietyRange, n(v.low) + "," + n(v.high));
 }
 
 void decompiler::attr_groups_and_props(const attr_common &a, uint16_t no_group, const prop_table &props) {
-    if (a.group_id != no_group) w_.stmt("GroupID", n(a.group_id));
-    if (a.group_msgid) w_.stmt("GroupName", n(a.group_msgid));
+    if (a.group_id != no_group) w_.stmt(kw::GroupID, n(a.group_id));
+    if (a.group_msgid) w_.stmt(kw::GroupName, n(a.group_msgid));
     if (unnamed_bits(props, a.props))
         w_.warn(c_quote(a.name) + ": properties " + hex(a.props) + " have bits without a keyword");
-    if (!prop_names(props, a.props).empty()) w_.stmt("Properties", props_text(props, a.props));
+    if (!prop_names(props, a.props).empty()) w_.stmt(kw::Properties, props_text(props, a.props));
 }
 
 void decompiler::valid_value_stmts(const char *name, const std::optional<valid_values> &vv) {
@@ -253,14 +250,14 @@ void decompiler::valid_value_stmts(const char *name, const std::optional<valid_v
         if (lo->find(',') != std::string::npos)
             w_.warn(std::string(name) + ": the value " + c_quote(*lo) + " holds a comma, which splits it");
         w_.text(name, *lo == *hi ? *lo : *lo + "," + *hi);
-        if (v.display_msgid) w_.stmt("ValueDisplayName", n(v.display_msgid));
+        if (v.display_msgid) w_.stmt(kw::ValueDisplayName, n(v.display_msgid));
     }
 }
 
 // A default or initial value: nothing when it is what completion supplies,
 // else one statement per array element (DefaultValue) or one value.
 void decompiler::value_stmts(const char *name, const value &v, const std::string &attr, bool repeatable) {
-    if (is_sd_type(v.type)) return; // built from the definition
+    if (zu_is_sd_type(v.type)) return; // built from the definition
     if (v.kind == value_kind::array) {
         if (v.elements.size() == 1 && is_type_default(v.elements[0])) return;
         if (v.elements.empty() || (!repeatable && v.elements.size() != 1))
@@ -275,92 +272,92 @@ void decompiler::value_stmts(const char *name, const value &v, const std::string
 }
 
 void decompiler::pattr_stanza(const pattr &p) {
-    w_.stanza(p.of_class ? "PersistentClassAttribute" : "PersistentResourceAttribute");
+    w_.stanza(p.of_class ? stanza_names[ST_PERSISTENT_CLASS_ATTRIBUTE] : stanza_names[ST_PERSISTENT_RESOURCE_ATTRIBUTE]);
     attr_required(p);
     if (!(p.props & 0xe))
         w_.warn(c_quote(p.name) + ": properties without ReqdForDefine, OptForDefine or InvalForDefine");
     attr_groups_and_props(p, 0, pattr_props);
-    valid_value_stmts("ValidValue", p.vv);
-    value_stmts("DefaultValue", p.dflt, p.name, true);
-    attr_sd_run("PAttrSDDefinition", p);
+    valid_value_stmts(kw::ValidValue, p.vv);
+    value_stmts(kw::DefaultValue, p.dflt, p.name, true);
+    attr_sd_run(stanza_names[ST_PATTR_SD], p);
 }
 
 void decompiler::range_stmt(const dattr &d) {
     bool numbers = d.min.kind == value_kind::number && d.max.kind == value_kind::number;
-    if (!numbers || (!is_array_type(d.data_type) && is_default_range(d))) return;
+    if (!numbers || (!zu_is_array_type(d.data_type) && is_default_range(d))) return;
     auto lo = value_text(d.min, d.name), hi = value_text(d.max, d.name);
-    if (lo && hi) w_.stmt("Range", *lo + "," + *hi);
+    if (lo && hi) w_.stmt(kw::Range, *lo + "," + *hi);
 }
 
 void decompiler::dattr_stanza(const dattr &d) {
-    w_.stanza(d.of_class ? "DynamicClassAttribute" : "DynamicResourceAttribute");
+    w_.stanza(d.of_class ? stanza_names[ST_DYNAMIC_CLASS_ATTRIBUTE] : stanza_names[ST_DYNAMIC_RESOURCE_ATTRIBUTE]);
     attr_required(d);
-    w_.stmt("VariableType", var_type_name(d.var_type));
-    attr_groups_and_props(d, NO_GROUP, dattr_props);
-    valid_value_stmts("ValidStateValue", d.vv);
+    w_.stmt(kw::VariableType, var_type_name(d.var_type));
+    attr_groups_and_props(d, CDB_DEFAULT_GROUP_ID, dattr_props);
+    valid_value_stmts(kw::ValidStateValue, d.vv);
     auto vclass = vclass_of_.find(&d);
-    if (vclass != vclass_of_.end()) w_.text("VariableClass", vclass->second);
-    value_stmts("InitialValue", d.init, d.name, false);
-    if (d.expression) w_.text("Expression", *d.expression);
-    if (d.expr_desc) w_.stmt("ExpressionDescription", n(d.expr_desc));
-    if (d.rearm_expression) w_.text("ReArmExpression", *d.rearm_expression);
-    if (d.rearm_desc) w_.stmt("ReArmDescription", n(d.rearm_desc));
+    if (vclass != vclass_of_.end()) w_.text(kw::VariableClass, vclass->second);
+    value_stmts(kw::InitialValue, d.init, d.name, false);
+    if (d.expression) w_.text(kw::Expression, *d.expression);
+    if (d.expr_desc) w_.stmt(kw::ExpressionDescription, n(d.expr_desc));
+    if (d.rearm_expression) w_.text(kw::ReArmExpression, *d.rearm_expression);
+    if (d.rearm_desc) w_.stmt(kw::ReArmDescription, n(d.rearm_desc));
     if (d.range_desc) w_.warn(c_quote(d.name) + ": range description " + n(d.range_desc) + " cannot be given");
     range_stmt(d);
-    attr_sd_run("DAttrSDDefinition", d);
+    attr_sd_run(stanza_names[ST_DATTR_SD], d);
 }
 
 // ---------------------------------------------------------------------------
 // Actions, map, variable classes
 
 void decompiler::action_stanza(const action &x) {
-    w_.stanza(x.of_class ? "ClassAction" : "ResourceAction");
-    w_.text("Name", x.name);
-    w_.stmt("Description", n(x.description_msgid));
-    w_.stmt("DisplayName", n(x.display_msgid));
-    w_.stmt("Id", std::to_string(x.id));
+    w_.stanza(x.of_class ? stanza_names[ST_CLASS_ACTION] : stanza_names[ST_RESOURCE_ACTION]);
+    w_.text(kw::Name, x.name);
+    w_.stmt(kw::Description, n(x.description_msgid));
+    w_.stmt(kw::DisplayName, n(x.display_msgid));
+    w_.stmt(kw::Id, std::to_string(x.id));
     if (x.varieties.empty()) w_.warn(c_quote(x.name) + ": at least one VarietyRange is required");
-    for (const variety &v : x.varieties) w_.stmt("VarietyRange", n(v.low) + "," + n(v.high));
+    for (const variety &v : x.varieties) w_.stmt(kw::VarietyRange, n(v.low) + "," + n(v.high));
     if (unnamed_bits(action_props, x.props))
         w_.warn(c_quote(x.name) + ": properties " + hex(x.props) + " have bits without a keyword");
-    if (x.props) w_.stmt("Properties", props_text(action_props, x.props));
+    if (x.props) w_.stmt(kw::Properties, props_text(action_props, x.props));
     // Only the first letter counts; one that is no permission letter stores nothing.
     auto letters = prop_names(perm_letters, x.perms);
     if (x.perms == 0)
-        w_.stmt("Permission", "-");
+        w_.stmt(kw::Permission, "-");
     else if (letters.size() == 1 && unnamed_bits(perm_letters, x.perms) == 0) {
-        if (x.perms != DEFAULT_PERMISSION) w_.stmt("Permission", letters[0]);
+        if (x.perms != CDB_DEFAULT_PERMISSION) w_.stmt(kw::Permission, letters[0]);
     } else
         w_.warn(c_quote(x.name) + ": permission " + hex(x.perms) + " is not one letter");
-    if (x.confirm_msgid) w_.stmt("ConfirmationMsg", n(x.confirm_msgid));
-    if (x.timeout) w_.stmt("TimeOut", n(x.timeout));
-    if (x.sd_input) sd_run("ActionInSDDefinition", *x.sd_input, true, true);
-    if (x.sd_response) sd_run("ActionOutSDDefinition", *x.sd_response, true, false);
+    if (x.confirm_msgid) w_.stmt(kw::ConfirmationMsg, n(x.confirm_msgid));
+    if (x.timeout) w_.stmt(kw::TimeOut, n(x.timeout));
+    if (x.sd_input) sd_run(stanza_names[ST_ACTION_IN_SD], *x.sd_input, true, true);
+    if (x.sd_response) sd_run(stanza_names[ST_ACTION_OUT_SD], *x.sd_response, true, false);
 }
 
 void decompiler::map_stanza(const map_dsect &m) {
-    w_.stanza("ClassToManagerMapping");
+    w_.stanza(stanza_names[ST_CLASS_TO_MANAGER_MAPPING]);
     for (const dsect &d : f_.dsects)
         if (auto *mgr = std::get_if<mgr_dsect>(&d)) {
-            w_.text("ResourceManager", mgr->name);
+            w_.text(kw::ResourceManager, mgr->name);
             if (mgr->id) w_.warn("manager id " + n(mgr->id) + " cannot be given");
         }
-    w_.stmt("FirstKey", n(m.first_key));
-    w_.stmt("LastKey", n(m.last_key));
+    w_.stmt(kw::FirstKey, n(m.first_key));
+    w_.stmt(kw::LastKey, n(m.last_key));
     if (m.first_key > m.last_key) w_.warn("FirstKey is greater than LastKey, which the compiler refuses");
-    if (m.message_catalog) w_.text("MessageCatalog", *m.message_catalog);
-    w_.stmt("DescriptiveMessageSet", n(m.dscr_msg_set));
+    if (m.message_catalog) w_.text(kw::MessageCatalog, *m.message_catalog);
+    w_.stmt(kw::DescriptiveMessageSet, n(m.dscr_msg_set));
     uint32_t others = m.class_id | m.rm_id | m.asnno_start | m.num_sctx | m.num_vctx | m.num_stats | m.num_ctx_tmplts |
                       m.static_contexts | m.volatile_contexts | m.stats | m.ctx_tmplts;
     if (others) w_.warn("the map's ids, contexts and statistics cannot be given; the compiler writes 0");
 }
 
 void decompiler::var_class_stanza(const var_class_dsect &v) {
-    w_.stanza("ResourceVariableClass");
-    if (v.name) w_.text("VariableClass", *v.name);
-    w_.stmt("ObservationInterval", n(v.obsv_interval));
-    w_.stmt("ReportingInterval", n(v.report_interval));
-    if (v.alias) w_.text("Alias", *v.alias);
+    w_.stanza(stanza_names[ST_RESOURCE_VARIABLE_CLASS]);
+    if (v.name) w_.text(kw::VariableClass, *v.name);
+    w_.stmt(kw::ObservationInterval, n(v.obsv_interval));
+    w_.stmt(kw::ReportingInterval, n(v.report_interval));
+    if (v.alias) w_.text(kw::Alias, *v.alias);
 }
 
 // The file keeps, per variable class, the IDs of the dynamic attributes that
@@ -393,7 +390,7 @@ void decompiler::assign_variable_classes() {
     for (const dsect &d : f_.dsects) {
         auto *c = std::get_if<class_dsect>(&d);
         if (!c) continue;
-        for (const dattr &a : c->dattrs_class) take(a, uint32_t(a.id) | 0x8000);
+        for (const dattr &a : c->dattrs_class) take(a, uint32_t(a.id) | CDB_CLASS_VAR_ID_BIT);
         for (const dattr &a : c->dattrs) take(a, uint32_t(a.id));
     }
     for (const cursor &c : vcs)

@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "cdb_format.h"
 #include "cdb_source.h"
 #include "cdb_text.h"
 
@@ -14,7 +15,7 @@ namespace cdbdump {
 namespace {
 // The reader takes at most 254 characters per read, newline included.
 constexpr size_t MAX_LINE = 253;
-constexpr size_t MAX_VALUE = 1797;
+constexpr size_t MAX_VALUE = QECFG_MAX_VALUE_LEN;
 
 bool blank(char c) { return c == ' ' || c == '\t'; }
 

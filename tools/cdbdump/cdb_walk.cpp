@@ -18,7 +18,6 @@ struct read_past_end {
     size_t off;
 };
 
-constexpr size_t round8(size_t n) { return (n + 7) & ~size_t(7); }
 
 const char *const size_fields[NUM_RECORD_SIZES] = {
     "cdb_hdr_rsrc_class_size",          "cdb_hdr_rsrc_cmmap_size", "cdb_hdr_rsrc_mgr_size",
@@ -175,8 +174,7 @@ void walker::walk_header(cdb_file &f) {
           "cdb_hdr_length is " + std::to_string(f.length) + ", but the file has " + std::to_string(n_ - 4) +
               " bytes after the length field");
     f.checksum = uint32_t(get(4, 4));
-    uint32_t sum = f.length;
-    for (size_t off = 8; off <= n_ - 4; off += 4) sum ^= uint32_t(get(off, 4));
+    uint32_t sum = cdb_checksum(uint32_t(n_ - 4), [&](size_t off) { return uint32_t(get(off, 4)); });
     emit(4, 4, "header.cdb_hdr_checksum",
          hex(f.checksum) + (sum == f.checksum ? " (matches)" : " (computed " + hex(sum) + ")"));
     check(sum == f.checksum, 4,

@@ -197,7 +197,7 @@ void walker::walk_attr_common(size_t rec, const std::string &path, const class_t
                        path + ".ra_data_type: data type " + std::to_string(a.data_type) + " is out of range (0 to 22)");
     a.varieties = walk_varieties(rec + l.varieties, t, path + ".u_ra_variety_list");
     if (typed)
-        a.vv = walk_valid_values(rec + l.valid_values, element_type(a.data_type), t, path + ".u_ra_valid_vals");
+        a.vv = walk_valid_values(rec + l.valid_values, zu_element_type(a.data_type), t, path + ".u_ra_valid_vals");
     else
         emit(rec + l.valid_values, 8, path + ".u_ra_valid_vals", "not read: no data type to read it by");
     a.sd = walk_sd_def(rec + l.sd, t, path + ".u_ra_sd");
@@ -205,7 +205,7 @@ void walker::walk_attr_common(size_t rec, const std::string &path, const class_t
 }
 
 void walker::attr_value(size_t at, const attr_common &a, const std::string &field, const class_tables &t, value &out) {
-    if (is_sd_type(a.data_type) && !a.sd) {
+    if (zu_is_sd_type(a.data_type) && !a.sd) {
         // A structured attribute without definition keeps its value 0: no body.
         uint64_t v = get(at, 8);
         emit(at, 8, field, hex(v) + " (structured value without definition)");
@@ -275,7 +275,7 @@ bool walker::is_default_range_array(size_t at, uint32_t elem_type, uint64_t expe
 
 void walker::decide_range(const pending_range &p, const class_tables &t) {
     dattr &d = *p.target;
-    uint32_t et = element_type(d.data_type);
+    uint32_t et = zu_element_type(d.data_type);
     size_t lo = p.record + offsetof(rsrc_dattr_t, ra_min_value);
     size_t hi = p.record + offsetof(rsrc_dattr_t, ra_max_value);
     bool arrays = is_default_range_array(lo, et, 0, t) && is_default_range_array(hi, et, hundred_bits(et), t);

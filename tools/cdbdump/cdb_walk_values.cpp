@@ -90,7 +90,7 @@ std::optional<sd_definition> walker::walk_sd_def(size_t at, const class_tables &
         size_t type_at = e + offsetof(sd_field, sd_field_type);
         el.type = uint32_t(get(type_at, 4));
         emit(type_at, 4, name + ".sd_field_type", std::to_string(el.type) + " (" + data_type_name(el.type) + ")");
-        bool typed = check(el.type < ZU_NUM_DATA_TYPES && !is_sd_type(el.type), type_at,
+        bool typed = check(el.type < ZU_NUM_DATA_TYPES && !zu_is_sd_type(el.type), type_at,
                            name + ".sd_field_type: " +
                                (el.type < ZU_NUM_DATA_TYPES
                                     ? "an element cannot be of a structured type"
@@ -98,7 +98,7 @@ std::optional<sd_definition> walker::walk_sd_def(size_t at, const class_tables &
         el.display_msgid = uint16_t(num(e + offsetof(sd_field, sd_disp_msgid), 2, name + ".sd_disp_msgid"));
         el.description_msgid = uint16_t(num(e + offsetof(sd_field, sd_dscr_msgid), 2, name + ".sd_dscr_msgid"));
         if (typed)
-            el.vv = walk_valid_values(e + offsetof(sd_field, u_sd_valid_vals), element_type(el.type), t,
+            el.vv = walk_valid_values(e + offsetof(sd_field, u_sd_valid_vals), zu_element_type(el.type), t,
                                       name + ".u_sd_valid_vals");
         else
             emit(e + offsetof(sd_field, u_sd_valid_vals), 8, name + ".u_sd_valid_vals",
@@ -120,7 +120,7 @@ value walker::typed_value(size_t at, uint32_t type, const class_tables &t, const
                field + ": data type " + std::to_string(type) + " is out of range (0 to 22)"))
         type = ZU_UNKNOWN;
     v.type = type;
-    if (is_numeric_type(type)) {
+    if (zu_is_numeric_type(type)) {
         v.kind = value_kind::number;
         v.bits = get(at, is_wide_type(type) ? 8 : 4);
         emit(at, 8, field, data_type_name(type) + " " + number_text(type, v.bits));
@@ -198,7 +198,7 @@ void walker::array_body(size_t body, size_t room, size_t at, const class_tables 
         return;
     v.kind = value_kind::array;
     for (uint32_t i = 0; i < count; i++)
-        v.elements.push_back(typed_value(body + ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * i, element_type(v.type),
+        v.elements.push_back(typed_value(body + ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * i, zu_element_type(v.type),
                                          t, item(field, i)));
 }
 
@@ -219,7 +219,7 @@ void walker::sd_body(size_t body, size_t room, size_t at, const class_tables &t,
         size_t e = body + ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * i;
         uint32_t dt = uint32_t(get(e, 4));
         emit(e, 4, item(field, i) + ".data_type", std::to_string(dt) + " (" + data_type_name(dt) + ")");
-        if (!check(dt < ZU_NUM_DATA_TYPES && !is_sd_type(dt), e,
+        if (!check(dt < ZU_NUM_DATA_TYPES && !zu_is_sd_type(dt), e,
                    item(field, i) + ".data_type: " +
                        (dt < ZU_NUM_DATA_TYPES ? "an element cannot be of a structured type"
                                                : "data type " + std::to_string(dt) + " is out of range (0 to 22)")))
