@@ -1,5 +1,5 @@
 // A test-only CDB writer, independent of the reader and of include/cdb.h:
-// every offset and size below is written by hand from the format's tables.
+// every offset and size below is written by hand from the record layouts.
 #ifndef CDBDUMP_TEST_CDB_IMAGE_H
 #define CDBDUMP_TEST_CDB_IMAGE_H
 

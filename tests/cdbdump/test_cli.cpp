@@ -44,7 +44,7 @@ struct temp_file {
 };
 
 std::vector<uint8_t> corrupt_image() {
-    std::vector<uint8_t> b = cdbtest::worked_example(false);
+    std::vector<uint8_t> b = cdbtest::one_attribute_class(false);
     b[200] ^= 1; // the checksum no longer matches
     return b;
 }
@@ -81,7 +81,7 @@ TEST(Cli, HelpAndVersion) {
 }
 
 TEST(Cli, ModesAndExitStatuses) {
-    temp_file good(cdbtest::worked_example(true)), bad(corrupt_image(), "_cdbdump_cli_bad.cdef");
+    temp_file good(cdbtest::one_attribute_class(true)), bad(corrupt_image(), "_cdbdump_cli_bad.cdef");
     cli_result check = cli({"--check", good.path});
     EXPECT_EQ(check.status, 0);
     EXPECT_TRUE(check.out.empty() && check.err.empty());
@@ -100,7 +100,7 @@ TEST(Cli, ModesAndExitStatuses) {
 }
 
 TEST(Cli, ReadsStandardInput) {
-    temp_file good(cdbtest::worked_example(false)), bad(corrupt_image(), "_cdbdump_cli_bad.cdef");
+    temp_file good(cdbtest::one_attribute_class(false)), bad(corrupt_image(), "_cdbdump_cli_bad.cdef");
     EXPECT_EQ(run_binary("--check - < " + good.path), 0);
     EXPECT_EQ(run_binary("--check - < " + bad.path), 1);
     EXPECT_EQ(run_binary("--check"), 2);

@@ -8,11 +8,10 @@
 
 namespace cdbtest {
 
-// The worked example of the file layout: one class with one persistent
-// resource attribute, 40 bytes of class strings, 8 of manager strings and 16
-// of map strings.
-inline std::vector<uint8_t> worked_example(bool big) {
-    test_class c(big, "Worked.Example.Class");
+// One class with one persistent resource attribute, 40 bytes of class
+// strings, 8 of manager strings and 16 of map strings.
+inline std::vector<uint8_t> one_attribute_class(bool big) {
+    test_class c(big, "One.Attribute.Class");
     buf &p = c.pattr(false, "Size", 1, 8);
     p.put(24, c.strings.text(""), 4);
     return image({c});

@@ -142,7 +142,7 @@ TEST(Limits, OutputThatCannotBeWrittenIsAnError) {
 
 TEST(Limits, InputRefusedBeforeItIsRead) {
     work_dir w;
-    std::string good = write_file(w, "good.cdef", cdbtest::worked_example(false));
+    std::string good = write_file(w, "good.cdef", cdbtest::one_attribute_class(false));
     fs::resize_file(write_file(w, "sparse.cdef", {}), (uint64_t(1) << 32) + 748);
     std::string length = std::to_string(fs::file_size(good) - 4);
     std::ofstream(w.path / "source.src") << large_source(1, 1);

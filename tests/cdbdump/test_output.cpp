@@ -158,7 +158,7 @@ TEST(Output, TextShowsHeaderFirstThenEachDsect) {
 }
 
 TEST(Output, AnnotationLabelsEveryByteOnce) {
-    std::vector<uint8_t> b = cdbtest::worked_example(false);
+    std::vector<uint8_t> b = cdbtest::one_attribute_class(false);
     annotation a = annotate_walk(b.data(), b.size());
     EXPECT_EQ(a.violations, 0u);
     std::vector<span> spans = a.spans;
