@@ -15,8 +15,6 @@
 struct record_table {
     tbl t;
     uint32_t count = 0;
-    size_t records(size_t size) const { return tbl_used(&t) / size; }
-    char *at(size_t i, size_t size) const { return t.tbl_base + i * size; }
     template <typename R> void append(qecfg_context &c, const R &rec) {
         std::memcpy(c.alloc_tble(&t, sizeof(R)), &rec, sizeof(R));
         count++;
