@@ -5,11 +5,12 @@
 #include <new>
 
 #include "qecfg.h"
+#include "qecfg_sink.h"
 
 qecfg_compiler::qecfg_compiler(qecfg_options opts) : opt(std::move(opts)) { bind_sc_tables(); }
 
 qecfg_compiler::~qecfg_compiler() {
-    release_output(false);
+    release_output();
     if (cdb_fp)
         std::fclose(cdb_fp);
     for (tbl *t : {&rsrc_class_tbl, &rsrc_cmmap_tbl, &rsrc_mgr_tbl, &rsrc_var_class_tbl})
@@ -126,7 +127,7 @@ void qecfg_compiler::run() {
         compile();
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
-        release_output(true);
+        release_output();
         qecfg_error_exit_rtn("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
     }
 }

@@ -9,6 +9,7 @@
 #include <memory>
 #include <set>
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <unordered_set>
 #include <vector>
@@ -188,6 +189,11 @@ struct qecfg_options {
     std::string cdefname;
     FILE *trace_out = stdout; // traces
     FILE *trace_err = stderr; // the table growth trace
+    // A source held in memory (cdefsrc is then only its name).
+    bool source_in_memory = false;
+    std::string_view source_text;
+    // Where the image goes; the file cdefname when null.
+    class image_sink *sink = nullptr;
 };
 
 // The class locator given by a ResourceClass statement, pending until the
@@ -370,9 +376,9 @@ class qecfg_compiler {
 
     // builder
     uint64_t class_dsect_size(rsrc_class_t *rc);
-    void release_output(bool remove_file);
-    [[noreturn]] void output_error(const char *msg, int err);
-    char *get_mapfile(size_t cdb_file_size);
+    void release_output();
+    [[noreturn]] void output_failed(const struct sink_failure &f);
+    char *acquire_image(size_t cdb_file_size);
     void begin_dsect(cdb_dsect_type_t type);
     char *copy_record(cdb_dsect_type_t type, const char *src, size_t size);
     void grow_dsect(size_t len);
@@ -383,7 +389,7 @@ class qecfg_compiler {
     void add_rsrc_mgr_tbls();
     void add_rsrc_cmmap_tbls();
     void add_rsrc_var_class_tbls();
-    void flush_mapfile();
+    void commit_image();
 
     // Lengths of the attribute keywords, by stanza type and row.
     size_t attr_name_len[NUM_STANZA_TYPES][MAX_ATTRS_PER_STANZA] = {};
@@ -424,10 +430,9 @@ class qecfg_compiler {
     char *dsp = nullptr;
     uint32_t dsect_count = 0, dsect_idx = 0;
     uint16_t hdr_max_class_id = 0, hdr_max_rm_id = 0;
-    int cdb_mapfile_fd = -1;
-    void *cdb_mapfile_ptr = nullptr;
-    size_t gross_file_size = 0;
-    bool output_created = false, output_regular = false;
+    image_sink *sink = nullptr;
+    std::unique_ptr<image_sink> own_sink; // the file sink, when none is given
+    bool image_pending = false;           // acquired, neither committed nor abandoned
 
     // Zero-filled memory of the compile, handed out from large chunks: the
     // copies of value texts and the table objects. Table storage itself is
@@ -438,6 +443,9 @@ class qecfg_compiler {
     std::vector<tbl *> owned_tbls;
     std::vector<tbl *> free_tbls; // emptied default lists, for new_tbl to reuse
 };
+
+// A stream over a source held in memory.
+FILE *open_memory_source(std::string_view text);
 
 // Trace output of a compile.
 #define QECFG_TRACE(c, ...) std::fprintf((c).opt.trace_out, __VA_ARGS__)

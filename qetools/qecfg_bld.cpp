@@ -1,23 +1,19 @@
-// The CDB builder: exact size, the output file extended and mapped, the
-// header, anchors and dsects laid into the mapping, the checksum, and the
+// The CDB builder: exact size, the image taken from the sink, the header,
+// anchors and dsects laid into it, the checksum, and the
 // variable ID tables that group dynamic attributes by variable class.
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
-#include <fcntl.h>
-#include <sys/mman.h>
-#include <sys/stat.h>
 #include <sys/time.h>
-#include <unistd.h>
 
 #include "qecfg.h"
+#include "qecfg_sink.h"
 
 namespace {
 
 constexpr uint16_t CLASS_ID_BIT = 0x8000;
 constexpr size_t MAX_TABLE_RECORDS = 65535;
 constexpr uint64_t MAX_IMAGE = uint64_t(1) << 32;
-constexpr size_t EXTEND_BLOCK = 1024;
 
 const char *string_at(const tbl *t, uint32_t off) {
     return t && off < tbl_used(t) && std::memchr(t->tbl_base + off, '\0', tbl_used(t) - off) ? t->tbl_base + off
@@ -149,7 +145,7 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
 // The output file.
 
 void qecfg_compiler::bld_error_exit(const char *msg, const char *v1, const char *v2, int code) {
-    release_output(true);
+    release_output();
     std::string text;
     if (msg) {
         text = std::string(msg) + (v1 ? v1 : "") + (v2 ? v2 : "");
@@ -159,63 +155,29 @@ void qecfg_compiler::bld_error_exit(const char *msg, const char *v1, const char 
     throw qecfg_fatal{text, code};
 }
 
-// Unmaps and closes the output; a failed build also removes it, but only
-// when it is a regular file (never a device or a FIFO named as output).
-void qecfg_compiler::release_output(bool remove_file) {
-    if (cdb_mapfile_ptr) {
-        munmap(cdb_mapfile_ptr, gross_file_size);
-        cdb_mapfile_ptr = nullptr;
-    }
-    if (cdb_mapfile_fd >= 0) {
-        close(cdb_mapfile_fd);
-        cdb_mapfile_fd = -1;
-    }
-    if (remove_file && output_created && output_regular)
-        std::remove(opt.cdefname.c_str());
-    output_created = false;
+// A failed build leaves nothing of its image behind.
+void qecfg_compiler::release_output() {
+    if (image_pending)
+        sink->abandon();
+    image_pending = false;
 }
 
-[[noreturn]] void qecfg_compiler::output_error(const char *msg, int err) {
-    bld_error_exit(msg, std::strerror(err), nullptr, 1);
+[[noreturn]] void qecfg_compiler::output_failed(const sink_failure &f) {
+    bld_error_exit(f.prefix, f.text ? f.text : std::strerror(f.err), nullptr, 1);
 }
 
-char *qecfg_compiler::get_mapfile(size_t cdb_file_size) {
-    // Non-blocking, so that a FIFO named as output fails instead of hanging.
-    int fd = open(opt.cdefname.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_NONBLOCK, 0644);
-    if (fd < 0)
-        output_error("Cannot create CDB file: ", errno);
-    cdb_mapfile_fd = fd;
-    output_created = true;
-    struct stat st;
-    output_regular = fstat(fd, &st) == 0 && S_ISREG(st.st_mode);
-    // Zeros are written, not a hole left, so that a full disk shows here and
-    // not as a fault while the mapping is filled. The image is extended in
-    // whole blocks of EXTEND_BLOCK bytes, written many blocks at a time.
-    static const char zeros[EXTEND_BLOCK * 256] = {};
-    gross_file_size = 0;
-    while (gross_file_size < cdb_file_size) {
-        size_t blocks = std::min<size_t>((cdb_file_size - gross_file_size + EXTEND_BLOCK - 1) / EXTEND_BLOCK, 256);
-        size_t want = blocks * EXTEND_BLOCK, done = 0;
-        while (done < want) {
-            ssize_t n = write(fd, zeros + done, want - done);
-            if (n < 0 && errno == EINTR)
-                continue;
-            if (n <= 0)
-                output_error("Cannot extend CDB file: ", n < 0 ? errno : ENOSPC);
-            done += size_t(n);
-        }
-        gross_file_size += want;
+char *qecfg_compiler::acquire_image(size_t cdb_file_size) {
+    sink = opt.sink;
+    if (!sink) {
+        own_sink = make_file_sink(opt.cdefname, opt.source_in_memory ? file_identity{} : identity_of(opt.cdefsrc));
+        sink = own_sink.get();
     }
-    if (fstat(fd, &st) != 0)
-        output_error("Cannot map CDB file: ", errno);
-    if (st.st_size < off_t(cdb_file_size))
-        output_error("Cannot map CDB file: ", EINVAL);
-    gross_file_size = size_t(st.st_size);
-    void *p = mmap(nullptr, gross_file_size, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
-    if (p == MAP_FAILED)
-        output_error("Cannot map CDB file: ", errno);
-    cdb_mapfile_ptr = p;
-    return static_cast<char *>(p);
+    image_pending = true;
+    try {
+        return sink->acquire(cdb_file_size);
+    } catch (const sink_failure &f) {
+        output_failed(f);
+    }
 }
 
 // ---------------------------------------------------------------------------
@@ -378,7 +340,7 @@ static qel_timeval32_t build_time() {
 void qecfg_compiler::bld_cdb() {
     dsect_count = rsrc_cmmap_count + rsrc_mgr_count + rsrc_var_class_count + rsrc_class_count;
     size_t size = cdb_size();
-    chp = get_mapfile(size);
+    chp = acquire_image(size);
     dsect_idx = 0;
     dsp = chp + CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * dsect_count;
     hdr_max_class_id = hdr_max_rm_id = 0;
@@ -409,22 +371,17 @@ void qecfg_compiler::bld_cdb() {
     for (uint32_t i = 0; i < (h.cdb_hdr_length - 4) / 4; i++)
         sum ^= load<uint32_t>(chp + 8 + 4 * size_t(i));
     store<uint32_t>(chp + offsetof(qel_cdb_header_t, cdb_hdr_checksum), sum);
-    flush_mapfile();
+    commit_image();
 }
 
-void qecfg_compiler::flush_mapfile() {
+void qecfg_compiler::commit_image() {
     size_t file_len = size_t(load<uint32_t>(chp)) + 4;
     if (opt.swap_endianness)
         qecfg_cdef_swap(reinterpret_cast<qel_cdb_header_t *>(chp), numeric_range_offsets);
-    void *p = cdb_mapfile_ptr;
-    cdb_mapfile_ptr = nullptr;
-    if (munmap(p, gross_file_size) != 0)
-        output_error("Cannot write CDB file: ", errno);
-    if (output_regular && ftruncate(cdb_mapfile_fd, off_t(file_len)) != 0)
-        output_error("Cannot write CDB file: ", errno);
-    int fd = cdb_mapfile_fd;
-    cdb_mapfile_fd = -1;
-    if (close(fd) != 0)
-        output_error("Cannot write CDB file: ", errno);
-    output_created = false;
+    try {
+        sink->commit(file_len);
+    } catch (const sink_failure &f) {
+        output_failed(f);
+    }
+    image_pending = false;
 }

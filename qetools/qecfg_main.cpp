@@ -2,36 +2,42 @@
 // database. The only place that prints a fatal message and exits.
 #include <cstdio>
 #include <cstdlib>
+#include <string>
 #include <unistd.h>
 
-#include "qecfg.h"
+#include "qecfg/qecfg.h"
+
+namespace {
+
+int report(const std::string &message, int status) {
+    std::fflush(stdout);
+    std::fputs(message.c_str(), stderr);
+    return status;
+}
+
+std::string usage(std::string text, const qecfg::options &opt) { return opt.message_newline ? text + "\n" : text; }
+
+} // namespace
 
 int main(int argc, char **argv) {
-    qecfg_options opt;
+    qecfg::options opt;
     int c;
     while ((c = getopt(argc, argv, "nd:s")) != -1) {
         switch (c) {
-        case 'n': opt.interactive = 0; break;
-        case 'd': opt.debugLevel = std::atoi(optarg); break;
-        case 's': opt.swap_endianness = 1; break;
+        case 'n': opt.message_newline = false; break;
+        case 'd': opt.trace_level = std::atoi(optarg); break;
+        case 's': opt.reverse_byte_order = true; break;
         default: return 1; // getopt has said what is wrong
         }
     }
-    try {
-        qecfg_compiler compile(opt);
-        if (optind >= argc)
-            compile.qecfg_error_exit_rtn("Usage: ", argv[0],
-                                         " [-s] cdefsrc_filename cdef_filename\n    -s Reverse endianness of CDB.\n",
-                                         0, 1);
-        if (optind + 1 >= argc)
-            compile.qecfg_error_exit_rtn("usage: ", argv[0], " cdefsrc_filename cdef_filename", 0, 1);
-        compile.opt.cdefsrc = argv[optind];
-        compile.opt.cdefname = argv[optind + 1];
-        compile.run();
-    } catch (const qecfg_fatal &f) {
-        std::fflush(stdout);
-        std::fputs(f.message.c_str(), stderr);
-        return f.code;
-    }
-    return 0;
+    if (optind >= argc)
+        return report(usage(std::string("Usage: ") + argv[0] +
+                                " [-s] cdefsrc_filename cdef_filename\n    -s Reverse endianness of CDB.\n",
+                            opt),
+                      1);
+    if (optind + 1 >= argc)
+        return report(usage(std::string("usage: ") + argv[0] + " cdefsrc_filename cdef_filename", opt), 1);
+    qecfg::remove_temporary_files_on_signals();
+    qecfg::result r = qecfg::compile_to_file(qecfg::source::file(argv[optind]), argv[optind + 1], opt);
+    return r ? 0 : report(r.message, r.status);
 }

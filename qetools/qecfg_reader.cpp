@@ -180,7 +180,7 @@ sd_type_t qecfg_compiler::SD_stanza_type(int table_id) {
 }
 
 void qecfg_compiler::cache_input_data(const char *filename) {
-    cdb_fp = std::fopen(filename, "r");
+    cdb_fp = opt.source_in_memory ? open_memory_source(opt.source_text) : std::fopen(filename, "r");
     if (!cdb_fp) {
         int e = errno;
         qecfg_error_exit_rtn(filename, ": cannot open because: ", std::strerror(e), 0, e);

@@ -1,0 +1,54 @@
+// The compiler as a library: a source and the command line's options in, an
+// image or the fatal message and status out.
+#include "qecfg/qecfg.h"
+#include "qecfg.h"
+#include "qecfg_sink.h"
+
+namespace {
+
+qecfg_options compile_options(const qecfg::source &src, const qecfg::options &o, const std::string &output_name) {
+    qecfg_options opt;
+    opt.interactive = o.message_newline;
+    opt.debugLevel = o.trace_level;
+    opt.swap_endianness = o.reverse_byte_order;
+    opt.cdefsrc = src.name;
+    opt.cdefname = output_name;
+    opt.trace_out = o.trace_out;
+    opt.trace_err = o.trace_err;
+    opt.source_in_memory = src.in_memory;
+    opt.source_text = src.text;
+    return opt;
+}
+
+qecfg::result run(qecfg_options opt) {
+    try {
+        qecfg_compiler c(std::move(opt));
+        c.run();
+    } catch (const qecfg_fatal &f) {
+        return qecfg::result{f.code, f.message};
+    }
+    return {};
+}
+
+} // namespace
+
+FILE *open_memory_source(std::string_view text) {
+    // Reading never writes into the buffer; an empty one still needs an address.
+    return fmemopen(const_cast<char *>(text.empty() ? "" : text.data()), text.size(), "r");
+}
+
+qecfg::result qecfg::compile_to_memory(const source &src, std::vector<std::uint8_t> &image, const options &o) {
+    image.clear();
+    memory_sink sink(image);
+    qecfg_options opt = compile_options(src, o, o.output_name);
+    opt.sink = &sink;
+    return run(std::move(opt));
+}
+
+qecfg::result qecfg::compile_to_file(const source &src, const std::string &output_path, const options &o) {
+    qecfg_options opt = compile_options(src, o, o.output_name.empty() ? output_path : o.output_name);
+    std::unique_ptr<image_sink> sink =
+        make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name));
+    opt.sink = sink.get();
+    return run(std::move(opt));
+}
