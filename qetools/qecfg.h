@@ -168,6 +168,11 @@ struct anchor {
     uint32_t off = 0;
 };
 
+// Cuts comments and the newline off a piece of a source line; false when
+// nothing is left to process (a comment line or a line of blanks, tabs and
+// quotes). The checker reads sources through it too.
+bool strip_comments(char *line);
+
 // Conversions of value text (no compile state involved).
 zu_data_type_t strToZuDt(const char *s);
 int strToVar(const char *s, qel_variable_type_t *t);

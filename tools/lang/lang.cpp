@@ -109,4 +109,31 @@ std::string permission_letters() {
     return s;
 }
 
+bool strip_line_comment(char *piece) { return strip_comments(piece); }
+
+char *unquote(char *value) { return strip_quotes(value); }
+
+zu_data_type_t data_type_named(const std::string &name) { return strToZuDt(name.c_str()); }
+
+bool is_array(zu_data_type_t type) { return is_zu_array(type) != 0; }
+
+uint32_t version_number(const std::string &text) {
+    uint32_t n = 0;
+    ver_str_convert(text.c_str(), &n);
+    return n;
+}
+
+zu_data_type_t element_type_of(zu_data_type_t type) { return scalar_zu(type); }
+
+bool value_converts(zu_data_type_t type, const std::string &text, zu_value_t *number) {
+    // A conversion needs a compile only for the storage of text copies.
+    qecfg_compiler c{qecfg_options{}};
+    zu_value_t v{};
+    if (c.str_to_zu(&v, type, text.c_str()) != 0)
+        return false;
+    if (number)
+        *number = v;
+    return true;
+}
+
 } // namespace lang

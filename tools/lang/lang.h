@@ -4,6 +4,7 @@
 #ifndef QECFG_LANG_H
 #define QECFG_LANG_H
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -74,6 +75,24 @@ struct property_table {
 };
 std::vector<property_table> property_tables();
 std::string permission_letters();
+
+// The reader's conventions. A source is read in pieces of at most this many
+// characters, each processed as a line.
+constexpr size_t READ_PIECE = 254;
+// Cuts the comment and newline off a piece; false when nothing is left.
+bool strip_line_comment(char *piece);
+// The value of a statement without its quotes; null for unmatched quotes.
+char *unquote(char *value);
+
+// The compiler's conversions of value text. A data type name gives ZU_UNKNOWN
+// when it names none. A value converts as the compiler converts it for that
+// type (an array type converts one element); `number` receives the numeric
+// members only.
+zu_data_type_t data_type_named(const std::string &name);
+bool is_array(zu_data_type_t type);
+uint32_t version_number(const std::string &text);
+zu_data_type_t element_type_of(zu_data_type_t type);
+bool value_converts(zu_data_type_t type, const std::string &text, zu_value_t *number = nullptr);
 
 } // namespace lang
 
