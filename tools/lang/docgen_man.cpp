@@ -54,8 +54,8 @@ std::vector<std::string> table_cells(const std::string &line) {
     std::string cell;
     for (size_t i = 1; i < line.size(); i++) {
         if (line[i] == '|' && line[i - 1] != '\\') {
-            size_t start = cell.find_first_not_of(' ');
-            cells.push_back(inline_roff(start == std::string::npos ? "" : cell.substr(start)));
+            size_t start = cell.find_first_not_of(' '), end = cell.find_last_not_of(' ');
+            cells.push_back(inline_roff(start == std::string::npos ? "" : cell.substr(start, end + 1 - start)));
             cell.clear();
         } else {
             cell += line[i];

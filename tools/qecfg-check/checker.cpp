@@ -165,7 +165,8 @@ status check_source(const std::string &path, const settings &s, writer &err) {
     std::string output_name = s.output_name.empty() ? default_output_name(path) : s.output_name;
     qecfg::result r = compile(path, output_name);
     if (r.status != 0 && r.status != 1) { // the source cannot be read, or memory ran out
-        err.put(path + ": error: " + r.message + "\n");
+        std::string why = r.message.rfind(path + ": ", 0) == 0 ? r.message.substr(path.size() + 2) : r.message;
+        err.put(path + ": error: " + why + "\n");
         return TROUBLE;
     }
     std::string text;
