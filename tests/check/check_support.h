@@ -11,36 +11,17 @@
 #include <vector>
 
 #include "checker.h"
+#include "compile_support.h"
 
 struct check_run {
     int status = -1;
     std::string out, err;
 };
 
-// Captures what is written to a FILE.
-class memory_file {
-  public:
-    memory_file() : f_(open_memstream(&buf_, &len_)) {}
-    ~memory_file() {
-        std::fclose(f_);
-        std::free(buf_);
-    }
-    std::FILE *get() { return f_; }
-    std::string text() {
-        std::fflush(f_);
-        return std::string(buf_, len_);
-    }
-
-  private:
-    char *buf_ = nullptr;
-    size_t len_ = 0;
-    std::FILE *f_;
-};
-
 inline check_run run_checker(const std::vector<std::string> &args) {
-    memory_file out, err;
+    captured_stream out, err;
     check_run r;
-    r.status = check::checker_main(args, out.get(), err.get());
+    r.status = check::checker_main(args, out.file(), err.file());
     r.out = out.text();
     r.err = err.text();
     return r;
@@ -51,7 +32,8 @@ inline check_run run_checker(const std::vector<std::string> &args) {
 inline check_run check_text(const std::string &source, std::vector<std::string> options = {}) {
     namespace fs = std::filesystem;
     static int serial = 0;
-    fs::path dir = fs::temp_directory_path() / ("qecfg-check-" + std::to_string(getpid()) + "-" + std::to_string(serial++));
+    fs::path dir =
+        fs::temp_directory_path() / ("qecfg-check-" + std::to_string(getpid()) + "-" + std::to_string(serial++));
     fs::create_directories(dir);
     std::ofstream(dir / "input.src", std::ios::binary) << source;
     fs::path here = fs::current_path();

@@ -55,8 +55,8 @@ TEST(CommandLine, ListNamesEveryWarning) {
 TEST(CommandLine, AFailedWriteIsAnError) {
     std::FILE *full = std::fopen("/dev/full", "w");
     ASSERT_NE(full, nullptr);
-    memory_file err;
-    EXPECT_EQ(check::checker_main({"--help"}, full, err.get()), 2);
+    captured_stream err;
+    EXPECT_EQ(check::checker_main({"--help"}, full, err.file()), 2);
     std::fclose(full);
 }
 

@@ -70,8 +70,7 @@ TEST(Reference, EditorFilesNameEveryStanzaAndKeyword) {
         for (const lang::stanza_type &s : lang::stanza_types()) {
             EXPECT_NE(stanzas.find("|" + s.name + "|"), std::string::npos) << f.path << " lacks " << s.name;
             for (const lang::statement_row &r : s.rows)
-                EXPECT_NE(keywords.find("|" + r.name + "|"), std::string::npos)
-                    << f.path << " lacks " << r.name;
+                EXPECT_NE(keywords.find("|" + r.name + "|"), std::string::npos) << f.path << " lacks " << r.name;
         }
     }
 }
@@ -120,12 +119,14 @@ TEST(Generator, FillsBlocksAndReportsMissingAndUnknownOnes) {
 }
 
 TEST(Generator, ManualPageEscapesRoffAndKeepsTables) {
-    std::string man = docgen::man_page("# Title\n\n## Part one\n\n.dot `a\\b` text\n\n| A | B |\n|---|---|\n| `x` | y |\n\n"
-                                       "```\n.code\\n\n```\n");
+    std::string man =
+        docgen::man_page("# Title\n\n## Part one\n\n.dot `a\\b` text\n\n| A | B |\n|---|---|\n| `x` | y |\n\n"
+                         "```\n.code\\n\n```\n");
     EXPECT_NE(man.find(".TH QECFG-SRC 5"), std::string::npos);
     EXPECT_NE(man.find(".SH PART ONE\n"), std::string::npos);
     EXPECT_NE(man.find("\\&.dot \\fBa\\eb\\fR text\n"), std::string::npos);
-    EXPECT_NE(man.find(".TS\nallbox;\nl lx.\nT{\nA\nT}\tT{\nB\nT}\nT{\n\\fBx\\fR\nT}\tT{\ny\nT}\n.TE\n"), std::string::npos);
+    EXPECT_NE(man.find(".TS\nallbox;\nl lx.\nT{\nA\nT}\tT{\nB\nT}\nT{\n\\fBx\\fR\nT}\tT{\ny\nT}\n.TE\n"),
+              std::string::npos);
     EXPECT_NE(man.find(".nf\n\\&.code\\en\n.fi\n"), std::string::npos);
 }
 

@@ -21,8 +21,9 @@ std::string source(const std::string &stanzas, const std::string &class_lines = 
 
 std::string attr(const char *kind, const std::string &name, int id, const std::string &type,
                  const std::string &more = "", const std::string &required_more = "") {
-    return std::string(kind) + "\n    Name=" + name + "\n    Description=1\n    DisplayName=2\n    Id=" +
-           std::to_string(id) + "\n    DataType=" + type + "\n    VarietyRange=1,1\n" + required_more + more;
+    return std::string(kind) + "\n    Name=" + name +
+           "\n    Description=1\n    DisplayName=2\n    Id=" + std::to_string(id) + "\n    DataType=" + type +
+           "\n    VarietyRange=1,1\n" + required_more + more;
 }
 std::string pattr(const std::string &name, int id, const std::string &type, const std::string &more = "") {
     return attr("PersistentResourceAttribute", name, id, type, more);
@@ -36,15 +37,14 @@ std::string action(const std::string &name, int id, const std::string &more = ""
 }
 std::string element(const std::string &type) {
     return "DefineSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
-           "    DataType=" + type + "\n";
+           "    DataType=" +
+           type + "\n";
 }
 const std::string USAGE = "ResourceVariableClass\n    VariableClass=Usage\n    ObservationInterval=1\n"
                           "    ReportingInterval=1\n";
 
 // Marks the line that holds `text` (its first occurrence) as the mistake.
-std::string here(std::string s, const std::string &text) {
-    return s.insert(s.find('\n', s.find(text)), " # here");
-}
+std::string here(std::string s, const std::string &text) { return s.insert(s.find('\n', s.find(text)), " # here"); }
 
 struct warning_case {
     const char *name;

@@ -121,8 +121,8 @@ std::string textmate_grammar() {
       << "        { \"name\": \"string.quoted.double.qecfg\", \"begin\": \"\\\"\", \"end\": \"\\\"\" },\n"
       << "        " << rule("comment.line.qecfg", comment) << ",\n"
       << "        " << rule("constant.language.qecfg", "\\b(" + join(value_words(), "|") + ")\\b") << ",\n"
-      << "        "
-      << rule("constant.numeric.qecfg", "(?<![\\w.])-?(0x[0-9A-Fa-f]+|\\d+(\\.\\d*)?([eE][-+]?\\d+)?)\\b") << "\n"
+      << "        " << rule("constant.numeric.qecfg", "(?<![\\w.])-?(0x[0-9A-Fa-f]+|\\d+(\\.\\d*)?([eE][-+]?\\d+)?)\\b")
+      << "\n"
       << "      ]\n"
       << "    }\n"
       << "  ]\n"

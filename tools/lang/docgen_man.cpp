@@ -12,9 +12,7 @@ namespace docgen {
 namespace {
 
 // A line that roff cannot take for a request.
-std::string safe_line(const std::string &s) {
-    return !s.empty() && (s[0] == '.' || s[0] == '\'') ? "\\&" + s : s;
-}
+std::string safe_line(const std::string &s) { return !s.empty() && (s[0] == '.' || s[0] == '\'') ? "\\&" + s : s; }
 
 std::string code_line(const std::string &s) {
     std::string o;

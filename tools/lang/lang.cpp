@@ -44,8 +44,8 @@ props_ref props_of_code(int code) {
 statement_row read_row(const table_attrs &r) {
     props_ref p = props_of_code(r.ta_type);
     bool optional = (r.req_bit & OPTIONAL_BIT) != 0;
-    return statement_row{r.ta_name,    kind_of_code[r.ta_type], optional, r.dup_allowed != 0,
-                         r.req_bit & ~OPTIONAL_BIT, p.words,  p.count};
+    return statement_row{
+        r.ta_name, kind_of_code[r.ta_type], optional, r.dup_allowed != 0, r.req_bit & ~OPTIONAL_BIT, p.words, p.count};
 }
 
 stanza_type read_stanza(const stanza_def &d) {

@@ -14,28 +14,28 @@ namespace lang {
 
 // What a statement's value is and what the compiler does with it.
 enum class value_kind {
-    integer,          // a number stored in 8 or 16 bits (message ids, keys, intervals)
-    identifier,       // a number stored in 32 bits
-    text,             // a string kept in the strings table
-    properties,       // a comma list of property words
-    version,          // a dotted version number
-    perm_template,    // a permission template: any non-empty text
-    manager,          // the resource manager name
-    locator,          // the name of a persistent resource attribute
-    variety,          // low,high variety numbers
-    valid_value,      // a value or low,high range of the attribute's or element's type
-    default_value,    // one value (one element for an array type)
-    initial_value,    // one value (one element for an array type)
-    display_name,     // a message id for the last valid value
-    data_type,        // a data type name
-    element_type,     // a data type name of a structured-data element
-    variable_type,    // a variable type name
-    range,            // low,high of the attribute's type
-    element_index,    // the position of the element, from 0
-    element_name,     // the element's name
-    refused,          // accepted by the keyword table, refused when given
-    ignored,          // accepted, nothing stored
-    permission,       // a permission letter
+    integer,       // a number stored in 8 or 16 bits (message ids, keys, intervals)
+    identifier,    // a number stored in 32 bits
+    text,          // a string kept in the strings table
+    properties,    // a comma list of property words
+    version,       // a dotted version number
+    perm_template, // a permission template: any non-empty text
+    manager,       // the resource manager name
+    locator,       // the name of a persistent resource attribute
+    variety,       // low,high variety numbers
+    valid_value,   // a value or low,high range of the attribute's or element's type
+    default_value, // one value (one element for an array type)
+    initial_value, // one value (one element for an array type)
+    display_name,  // a message id for the last valid value
+    data_type,     // a data type name
+    element_type,  // a data type name of a structured-data element
+    variable_type, // a variable type name
+    range,         // low,high of the attribute's type
+    element_index, // the position of the element, from 0
+    element_name,  // the element's name
+    refused,       // accepted by the keyword table, refused when given
+    ignored,       // accepted, nothing stored
+    permission,    // a permission letter
 };
 
 struct statement_row {
@@ -43,8 +43,8 @@ struct statement_row {
     value_kind kind;
     bool optional;
     bool repeatable;
-    unsigned bit;                   // the row's bit among the stanza's required or optional ones
-    const props_t *props;           // the property words of a properties row
+    unsigned bit;         // the row's bit among the stanza's required or optional ones
+    const props_t *props; // the property words of a properties row
     int props_count;
 };
 

@@ -84,11 +84,6 @@ const statement *statement_at(const source_model &m, int line) {
     return nullptr;
 }
 
-bool is_attribute(const stanza &s) {
-    return s.type && s.type->name.find("Attribute") != std::string::npos && !s.type->structured_data;
-}
-bool is_action(const stanza &s) { return s.is("ClassAction") || s.is("ResourceAction"); }
-
 // The records still open at a line: the pending structured-data element and
 // the last attribute and action of each kind in the current class.
 struct open_records {
@@ -113,11 +108,12 @@ open_records open_at(const source_model &m, int line, bool inclusive) {
         bool element = s.type && s.type->structured_data;
         r.element = element ? &s : nullptr;
         if (!element) // an action ends at any other stanza
-            r.last.erase(std::remove_if(r.last.begin(), r.last.end(), [](const stanza *k) { return is_action(*k); }),
+            r.last.erase(std::remove_if(r.last.begin(), r.last.end(), [](const stanza *k) { return k->is_action(); }),
                          r.last.end());
-        if (is_attribute(s) || is_action(s)) {
-            r.last.erase(std::remove_if(r.last.begin(), r.last.end(), [&](const stanza *k) { return k->type == s.type; }),
-                         r.last.end());
+        if (s.is_attribute() || s.is_action()) {
+            r.last.erase(
+                std::remove_if(r.last.begin(), r.last.end(), [&](const stanza *k) { return k->type == s.type; }),
+                r.last.end());
             r.last.push_back(&s);
         }
     }
@@ -143,9 +139,10 @@ std::vector<const stanza *> completed_at(const source_model &m, int line) {
         if (!header->type || !header->type->structured_data) {
             add_kinds(order, r, {"ResourceAction", "ClassAction"});
             if (header->is("ControlDefinition"))
-                add_kinds(order, r, {"PersistentClassAttribute", "DynamicClassAttribute",
-                                     "PersistentResourceAttribute", "DynamicResourceAttribute"});
-            else if (is_attribute(*header))
+                add_kinds(order, r,
+                          {"PersistentClassAttribute", "DynamicClassAttribute", "PersistentResourceAttribute",
+                           "DynamicResourceAttribute"});
+            else if (header->is_attribute())
                 add_kinds(order, r, {header->type->name.c_str()});
         }
     }
@@ -153,8 +150,9 @@ std::vector<const stanza *> completed_at(const source_model &m, int line) {
         open_records r = open_at(m, line, true);
         if (r.element)
             order.push_back(r.element);
-        add_kinds(order, r, {"PersistentResourceAttribute", "DynamicResourceAttribute", "PersistentClassAttribute",
-                             "DynamicClassAttribute", "ResourceAction", "ClassAction"});
+        add_kinds(order, r,
+                  {"PersistentResourceAttribute", "DynamicResourceAttribute", "PersistentClassAttribute",
+                   "DynamicClassAttribute", "ResourceAction", "ClassAction"});
     }
     return order;
 }
@@ -166,8 +164,8 @@ diagnostic incomplete_stanza(const diagnostic &d, const source_model &m) {
     for (const stanza *s : completed_at(m, d.line)) {
         std::vector<std::string> missing = missing_required(*s, m.last_line + 1, completion_required(*s));
         if (!missing.empty())
-            return {s->line, d.text + ": the " + s->type->name + " stanza lacks " + listing(missing) +
-                                 " (found at " + when + ")"};
+            return {s->line, d.text + ": the " + s->type->name + " stanza lacks " + listing(missing) + " (found at " +
+                                 when + ")"};
     }
     return d;
 }
@@ -209,7 +207,8 @@ diagnostic invalid_data(const diagnostic &d, const source_model &m) {
         std::string low = bad.substr(0, comma), high = bad.substr(comma + 1);
         bad = lang::value_converts(type, high) ? low : high;
     }
-    std::string what = lang::is_array(type) ? "an element of type " + type_name(type) : "a value of type " + type_name(type);
+    std::string what =
+        lang::is_array(type) ? "an element of type " + type_name(type) : "a value of type " + type_name(type);
     return {d.line, d.text + ": '" + bad + "' (" + st->keyword + ") is not " + what};
 }
 
@@ -295,8 +294,9 @@ diagnostic duplicate_statement(const diagnostic &d, const source_model &m) {
     if (!st || !s)
         return d;
     const statement *first = s->first(st->keyword);
-    return first && first != st ? diagnostic{d.line, d.text + " (first given on line " + std::to_string(first->line) + ")"}
-                                : d;
+    return first && first != st
+               ? diagnostic{d.line, d.text + " (first given on line " + std::to_string(first->line) + ")"}
+               : d;
 }
 
 diagnostic index_out_of_sequence(const diagnostic &d, const source_model &m) {
@@ -344,7 +344,9 @@ const explanation explanations[] = {
     {"Previous stanza incomplete", incomplete_stanza},
     {"str_to_zu: Invalid data", invalid_data},
     {"Invalid data type",
-     [](const diagnostic &d, const source_model &m) { return invalid_name(d, m, lang::data_type_names(), "the data types"); }},
+     [](const diagnostic &d, const source_model &m) {
+         return invalid_name(d, m, lang::data_type_names(), "the data types");
+     }},
     {"Invalid variable type",
      [](const diagnostic &d, const source_model &m) {
          return invalid_name(d, m, lang::variable_type_names(), "the variable types");
@@ -360,7 +362,9 @@ const explanation explanations[] = {
     {"Already defined. Duplicated definitions not allowed for ", duplicate_statement},
     {"ElementIndeces must be consecutive", index_out_of_sequence},
     {"No classes defined",
-     [](const diagnostic &d, const source_model &) { return with_hint(d, "the source has no ControlDefinition stanza"); }},
+     [](const diagnostic &d, const source_model &) {
+         return with_hint(d, "the source has no ControlDefinition stanza");
+     }},
     {"No class-to-manager maps defined",
      [](const diagnostic &d, const source_model &) {
          return with_hint(d, "the source needs a ClassToManagerMapping stanza");

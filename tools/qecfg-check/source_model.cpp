@@ -7,6 +7,10 @@
 
 namespace check {
 
+bool stanza::is_attribute() const {
+    return type && !type->structured_data && type->name.find("Attribute") != std::string::npos;
+}
+
 std::vector<const statement *> stanza::given(const std::string &keyword) const {
     std::vector<const statement *> v;
     for (const statement &s : statements)

@@ -13,8 +13,8 @@ namespace check {
 struct statement {
     int line = 0;
     std::string keyword;
-    std::string value;    // without its quotes
-    bool skipped = false; // the value is exactly "": the compiler ignores the statement
+    std::string value;                        // without its quotes
+    bool skipped = false;                     // the value is exactly "": the compiler ignores the statement
     const lang::statement_row *row = nullptr; // null when the stanza has no such statement
 };
 
@@ -25,6 +25,9 @@ struct stanza {
     std::vector<statement> statements;
 
     bool is(const char *type_name) const { return type && type->name == type_name; }
+    bool is_attribute() const;
+    bool is_dynamic() const { return is("DynamicResourceAttribute") || is("DynamicClassAttribute"); }
+    bool is_action() const { return is("ClassAction") || is("ResourceAction"); }
     // The statements of a keyword that the compiler takes, in order.
     std::vector<const statement *> given(const std::string &keyword) const;
     const statement *first(const std::string &keyword) const;

@@ -4,12 +4,12 @@
 #include "warnings.h"
 
 #include <algorithm>
-#include <cmath>
+#include <cctype>
+#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 #include <map>
 #include <optional>
-#include <set>
 
 #include "value_order.h"
 
@@ -20,15 +20,16 @@ namespace {
 std::string quoted(const std::string &s) { return "'" + s + "'"; }
 std::string on_line(int line) { return "line " + std::to_string(line); }
 
-bool is_attribute(const stanza &s) {
-    return s.type && !s.type->structured_data && s.type->name.find("Attribute") != std::string::npos;
-}
-bool is_dynamic(const stanza &s) { return s.is("DynamicResourceAttribute") || s.is("DynamicClassAttribute"); }
-
-// The data type of an attribute or element stanza.
-zu_data_type_t type_of(const stanza &s) {
+// The data type of an attribute or element stanza, and its name as given.
+std::string type_text(const stanza &s) {
     const statement *dt = s.first("DataType");
-    return dt ? lang::data_type_named(dt->value) : ZU_UNKNOWN;
+    return dt ? dt->value : "";
+}
+zu_data_type_t type_of(const stanza &s) { return lang::data_type_named(type_text(s)); }
+
+bool all_digits(const std::string &s) {
+    return !s.empty() &&
+           std::all_of(s.begin(), s.end(), [](char c) { return std::isdigit(static_cast<unsigned char>(c)); });
 }
 
 void locator(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
@@ -36,7 +37,7 @@ void locator(const source_model &m, const warning_context &, std::vector<diagnos
         std::vector<std::string> names;
         std::map<std::string, std::string> other_kinds;
         for (const stanza *s : cls)
-            if (const statement *n = s->first("Name"); n && is_attribute(*s)) {
+            if (const statement *n = s->first("Name"); n && s->is_attribute()) {
                 if (s->is("PersistentResourceAttribute"))
                     names.push_back(n->value);
                 else
@@ -50,7 +51,8 @@ void locator(const source_model &m, const warning_context &, std::vector<diagnos
                                   ? " is a " + other_kinds[loc->value] + ", not a PersistentResourceAttribute"
                                   : " names no PersistentResourceAttribute of this class";
             std::string hint = nearest(loc->value, names);
-            out.push_back({loc->line, "Locator " + quoted(loc->value) + why + (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)") +
+            out.push_back({loc->line, "Locator " + quoted(loc->value) + why +
+                                          (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)") +
                                           "; the class is stored without a locator"});
         }
     }
@@ -63,7 +65,8 @@ void report_repeats(const std::vector<std::pair<Key, const statement *>> &keyed,
     std::map<Key, const statement *> first;
     for (const auto &[key, st] : keyed)
         if (auto [it, fresh] = first.emplace(key, st); !fresh)
-            out.push_back({st->line, what + " " + quoted(st->value) + " is already given on " + on_line(it->second->line)});
+            out.push_back(
+                {st->line, what + " " + quoted(st->value) + " is already given on " + on_line(it->second->line)});
 }
 
 // The groups of stanzas of a class whose members must differ: each attribute
@@ -72,11 +75,10 @@ void report_repeats(const std::vector<std::pair<Key, const statement *>> &keyed,
 const std::vector<std::vector<const char *>> id_groups = {
     {"PersistentResourceAttribute"}, {"PersistentClassAttribute"}, {"DynamicResourceAttribute"},
     {"DynamicClassAttribute"},       {"ResourceAction"},           {"ClassAction"}};
-const std::vector<std::vector<const char *>> name_groups = {
-    {"PersistentResourceAttribute", "DynamicResourceAttribute"},
-    {"PersistentClassAttribute", "DynamicClassAttribute"},
-    {"ResourceAction"},
-    {"ClassAction"}};
+const std::vector<std::vector<const char *>> name_groups = {{"PersistentResourceAttribute", "DynamicResourceAttribute"},
+                                                            {"PersistentClassAttribute", "DynamicClassAttribute"},
+                                                            {"ResourceAction"},
+                                                            {"ClassAction"}};
 
 bool in_group(const stanza &s, const std::vector<const char *> &group) {
     return std::any_of(group.begin(), group.end(), [&](const char *t) { return s.is(t); });
@@ -123,7 +125,7 @@ void variable_class(const source_model &m, const warning_context &, std::vector<
         if (const statement *v = s.first("VariableClass"); v && s.is("ResourceVariableClass"))
             defined.push_back(v->value);
     for (const stanza &s : m.stanzas) {
-        const statement *v = is_dynamic(s) ? s.first("VariableClass") : nullptr;
+        const statement *v = s.is_dynamic() ? s.first("VariableClass") : nullptr;
         if (!v || std::find(defined.begin(), defined.end(), v->value) != defined.end())
             continue;
         std::string hint = nearest(v->value, defined);
@@ -153,14 +155,16 @@ std::vector<std::pair<number, int>> start_values(const stanza &s, const char *ke
     return v;
 }
 
-void check_start_values(const stanza &s, const char *keyword, const char *limits, const std::vector<value_range> &ranges,
-                        zu_data_type_t type, std::vector<diagnostic> &out) {
+void check_start_values(const stanza &s, const char *keyword, const char *limits,
+                        const std::vector<value_range> &ranges, zu_data_type_t type, std::vector<diagnostic> &out) {
     if (ranges.empty())
         return;
     for (const auto &[n, line] : start_values(s, keyword, type)) {
-        if (n.unordered() || std::any_of(ranges.begin(), ranges.end(), [&](const value_range &r) { return r.holds(n); }))
+        if (n.unordered() ||
+            std::any_of(ranges.begin(), ranges.end(), [&](const value_range &r) { return r.holds(n); }))
             continue;
-        std::string what = line ? keyword + std::string(" ") + n.text() : "the default " + n.text() + " (no " + keyword + ")";
+        std::string what =
+            line ? keyword + std::string(" ") + n.text() : "the default " + n.text() + " (no " + keyword + ")";
         out.push_back({line ? line : s.line, what + " lies outside the " + limits + " of " + s.type->name + " " +
                                                  quoted(s.first("Name") ? s.first("Name")->value : "")});
     }
@@ -169,13 +173,14 @@ void check_start_values(const stanza &s, const char *keyword, const char *limits
 void default_range(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
     for (const stanza &s : m.stanzas) {
         zu_data_type_t type = lang::element_type_of(type_of(s));
-        if (!is_attribute(s) || !is_numeric(type))
+        if (!s.is_attribute() || !is_numeric(type))
             continue;
-        if (!is_dynamic(s)) {
+        if (!s.is_dynamic()) {
             check_start_values(s, "DefaultValue", "ValidValue ranges", ranges_of(s, "ValidValue", type), type, out);
             continue;
         }
-        check_start_values(s, "InitialValue", "ValidStateValue ranges", ranges_of(s, "ValidStateValue", type), type, out);
+        check_start_values(s, "InitialValue", "ValidStateValue ranges", ranges_of(s, "ValidStateValue", type), type,
+                           out);
         check_start_values(s, "InitialValue", "Range", ranges_of(s, "Range", type), type, out);
     }
 }
@@ -193,9 +198,10 @@ void file_version(const source_model &m, const warning_context &, std::vector<di
             std::string parts = v->value + ".";
             size_t count = 0;
             bool plain = true;
-            for (size_t a = 0, b; (b = parts.find('.', a)) != std::string::npos; a = b + 1, count++)
-                plain = plain && b > a && std::all_of(parts.begin() + long(a), parts.begin() + long(b), ::isdigit) &&
-                        std::stoul(parts.substr(a, std::min<size_t>(b - a, 9))) <= 255 && b - a <= 3;
+            for (size_t a = 0, b; (b = parts.find('.', a)) != std::string::npos; a = b + 1, count++) {
+                std::string part = parts.substr(a, b - a);
+                plain = plain && all_digits(part) && part.size() <= 3 && std::stoi(part) <= 255;
+            }
             if (!plain || count > 4)
                 out.push_back({v->line, "FileVersion " + quoted(v->value) +
                                             " is not up to four dot-separated numbers of 0 to 255; it is stored as " +
@@ -206,7 +212,8 @@ void file_version(const source_model &m, const warning_context &, std::vector<di
 void unnamed_class(const source_model &m, const warning_context &ctx, std::vector<diagnostic> &out) {
     std::string name = ctx.output_name.substr(0, ctx.output_name.find(".cdef"));
     for (const auto &cls : m.classes())
-        if (std::none_of(cls.begin(), cls.end(), [](const stanza *s) { return s->is("ResourceClass") && s->first("Name"); }))
+        if (std::none_of(cls.begin(), cls.end(),
+                         [](const stanza *s) { return s->is("ResourceClass") && s->first("Name"); }))
             out.push_back({cls.front()->line, "the class has no Name statement and is named after the output file (" +
                                                   quoted(name) + " for output " + quoted(ctx.output_name) + ")"});
 }
@@ -224,15 +231,15 @@ void number_text(const source_model &m, const warning_context &, std::vector<dia
             case lang::value_kind::identifier: fits = plain_number(st.value, INT32_MIN, UINT32_MAX); break;
             case lang::value_kind::variety: {
                 size_t comma = st.value.find(',');
-                fits = comma == std::string::npos ||
-                       (plain_number(st.value.substr(0, comma), INT32_MIN, UINT32_MAX) &&
-                        plain_number(st.value.substr(comma + 1), INT32_MIN, UINT32_MAX));
+                fits = comma == std::string::npos || (plain_number(st.value.substr(0, comma), INT32_MIN, UINT32_MAX) &&
+                                                      plain_number(st.value.substr(comma + 1), INT32_MIN, UINT32_MAX));
                 break;
             }
             default: continue;
             }
             if (!fits)
-                out.push_back({st.line, st.keyword + "=" + st.value + " is not a number that fits its field; it is stored as " +
+                out.push_back({st.line, st.keyword + "=" + st.value +
+                                            " is not a number that fits its field; it is stored as " +
                                             stored_number(st.row->kind, st.value)});
         }
 }
@@ -256,7 +263,8 @@ void element_type(const source_model &m, const warning_context &, std::vector<di
         const statement *dt = s.type && s.type->structured_data ? s.first("DataType") : nullptr;
         if (dt && lang::data_type_named(dt->value) == ZU_UNKNOWN) {
             std::string hint = nearest(dt->value, lang::data_type_names());
-            out.push_back({dt->line, "DataType " + quoted(dt->value) + " names no data type; the element is stored with the type UNKNOWN" +
+            out.push_back({dt->line, "DataType " + quoted(dt->value) +
+                                         " names no data type; the element is stored with the type UNKNOWN" +
                                          (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)")});
         }
     }
@@ -264,10 +272,10 @@ void element_type(const source_model &m, const warning_context &, std::vector<di
 
 void ignored_range(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
     for (const stanza &s : m.stanzas) {
-        const statement *r = is_dynamic(s) ? s.first("Range") : nullptr;
+        const statement *r = s.is_dynamic() ? s.first("Range") : nullptr;
         zu_data_type_t t = lang::element_type_of(type_of(s));
         if (r && !is_numeric(t) && t != ZU_NONE)
-            out.push_back({r->line, "Range is ignored for the data type " + s.first("DataType")->value});
+            out.push_back({r->line, "Range is ignored for the data type " + type_text(s)});
     }
 }
 
@@ -289,9 +297,10 @@ void reversed_range(const source_model &m, const warning_context &, std::vector<
 void repeated_default(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
     for (const stanza &s : m.stanzas) {
         std::vector<const statement *> d = s.given("DefaultValue");
-        if (is_attribute(s) && d.size() > 1 && !lang::is_array(type_of(s)))
-            out.push_back({d[1]->line, "a second DefaultValue for the scalar type " + s.first("DataType")->value +
-                                           ": only the last one (line " + std::to_string(d.back()->line) + ") is kept"});
+        if (s.is_attribute() && d.size() > 1 && !lang::is_array(type_of(s)))
+            out.push_back({d[1]->line, "a second DefaultValue for the scalar type " + type_text(s) +
+                                           ": only the last one (line " + std::to_string(d.back()->line) +
+                                           ") is kept"});
     }
 }
 
