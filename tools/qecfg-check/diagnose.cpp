@@ -173,7 +173,7 @@ diagnostic incomplete_stanza(const diagnostic &d, const source_model &m) {
 diagnostic optional_too_early(const diagnostic &d, const source_model &m) {
     const stanza *s = m.stanza_at(d.line);
     const statement *st = statement_at(m, d.line);
-    if (!s || !s->type || !st)
+    if (!s || !s->type || !st || !ends_with(d.text, st->keyword))
         return d;
     std::string text = d.text.substr(0, d.text.size() - st->keyword.size()) + ": '" + st->keyword + "' ";
     if (!s->type->optional_accepted)
@@ -224,7 +224,7 @@ diagnostic invalid_name(const diagnostic &d, const source_model &m, const std::v
 diagnostic unknown_statement(const diagnostic &d, const source_model &m) {
     const statement *st = statement_at(m, d.line);
     const stanza *s = m.stanza_at(d.line);
-    if (!st || !s || !s->type)
+    if (!st || !s || !s->type || !ends_with(d.text, st->keyword + s->type->name))
         return d;
     std::string prefix = d.text.substr(0, d.text.size() - st->keyword.size() - s->type->name.size());
     return {d.line, prefix + "'" + st->keyword + "' is no statement of " + s->type->name +
