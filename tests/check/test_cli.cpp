@@ -52,6 +52,13 @@ TEST(CommandLine, ListNamesEveryWarning) {
         EXPECT_NE(r.out.find(std::string(w.name) + " "), std::string::npos) << w.name;
 }
 
+TEST(CommandLine, ReadmeExplainsEveryWarning) {
+    std::ifstream in(fs::path(QECFG_SOURCE_DIR) / "README.md");
+    std::string readme((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    for (const check::warning_check &w : check::warning_checks())
+        EXPECT_NE(readme.find("| `" + std::string(w.name) + "` | "), std::string::npos) << w.name;
+}
+
 TEST(CommandLine, AFailedWriteIsAnError) {
     std::FILE *full = std::fopen("/dev/full", "w");
     ASSERT_NE(full, nullptr);
