@@ -1,53 +1,31 @@
 // Round-trip fuzz harness: a source that compiles must give a file that the
 // reader accepts, whose decompiled source compiles into the same content, and
 // whose reversed-byte-order form holds the same content too.
-#include <cerrno>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
-#include <iterator>
-#include <sstream>
 #include <string>
-#include <sys/stat.h>
-#include <unistd.h>
+#include <vector>
 
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
 #include "cdb_tree.h"
 #include "cdb_walk.h"
-#include "qecfg.h"
+#include "qecfg/qecfg.h"
 
 namespace {
 
-const std::string &work_dir() {
-    static const std::string dir = [] {
-        std::string d = "/tmp/qecfg-roundtrip-" + std::to_string(getpid());
-        mkdir(d.c_str(), 0700);
-        return d;
-    }();
-    return dir;
-}
-
-// Compiles the text; the file's bytes, or nothing when the compile stops.
+// Compiles the text; the image, or nothing when the compile stops.
 bool compile(const std::string &text, bool swap, std::string &image) {
     static FILE *devnull = std::fopen("/dev/null", "w");
-    std::string src = work_dir() + "/input.src", out = work_dir() + "/out.cdef";
-    std::ofstream(src, std::ios::binary) << text;
-    qecfg_options opt;
-    opt.cdefsrc = src;
-    opt.cdefname = out;
-    opt.swap_endianness = swap;
+    qecfg::options opt;
+    opt.output_name = "out.cdef";
+    opt.reverse_byte_order = swap;
     opt.trace_out = opt.trace_err = devnull;
-    try {
-        qecfg_compiler c(opt);
-        c.run();
-    } catch (const qecfg_fatal &) {
+    std::vector<uint8_t> bytes;
+    if (!qecfg::compile_to_memory(qecfg::source::bytes("input.src", text), bytes, opt))
         return false;
-    }
-    std::ifstream in(out, std::ios::binary);
-    image.assign(std::istreambuf_iterator<char>(in), {});
-    std::remove(out.c_str());
+    image.assign(bytes.begin(), bytes.end());
     return true;
 }
 

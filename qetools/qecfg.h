@@ -30,13 +30,12 @@ struct tbl {
     char *tbl_base = nullptr;
     char *tbl_prev_base = nullptr;
     char *tbl_next = nullptr;
-    size_t tbl_size = 0;
-    char *tbl_end = nullptr;
+    size_t tbl_size = 0; // the size in whole allocation units, as the traces report it
     size_t tbl_au = 0;
     const char *tbl_name = nullptr;
-    // Room actually reserved behind tbl_base. It grows geometrically so that a
-    // table of any size is copied a bounded number of times; tbl_size keeps
-    // the growth in whole allocation units that the traces report.
+    // Room actually reserved behind tbl_base: what is used, grown
+    // geometrically so that a table of any size is copied a bounded number
+    // of times; room past tbl_next is not touched until it is handed out.
     size_t tbl_cap = 0;
 };
 
@@ -229,6 +228,7 @@ class qecfg_compiler {
     void *alloc_tble(tbl *t, size_t s);
     zu_uint32_t save_tbl_val_round(tbl *tp, const void *val, size_t len);
     zu_uint32_t add_to_tbl(tbl *tp, const void *data, size_t len) { return save_tbl_val_round(tp, data, len); }
+    void release_if_empty(cdb_ref_t &ref);
 
     // --- value text
     int str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in);
@@ -318,10 +318,10 @@ class qecfg_compiler {
     rsrc_action_t cb_rsrc_actionC{};
     sd_def_t cb_sd_def{};
 
-    tbl rsrc_class_tbl{nullptr, nullptr, nullptr, 0, nullptr, 3584, "ResourceClasses", 0};
-    tbl rsrc_cmmap_tbl{nullptr, nullptr, nullptr, 0, nullptr, 480, "ResourceCMMaps", 0};
-    tbl rsrc_mgr_tbl{nullptr, nullptr, nullptr, 0, nullptr, 192, "ResourceManagers", 0};
-    tbl rsrc_var_class_tbl{nullptr, nullptr, nullptr, 0, nullptr, 320, "ResourceVariableClasses", 0};
+    tbl rsrc_class_tbl{nullptr, nullptr, nullptr, 0, 3584, "ResourceClasses", 0};
+    tbl rsrc_cmmap_tbl{nullptr, nullptr, nullptr, 0, 480, "ResourceCMMaps", 0};
+    tbl rsrc_mgr_tbl{nullptr, nullptr, nullptr, 0, 192, "ResourceManagers", 0};
+    tbl rsrc_var_class_tbl{nullptr, nullptr, nullptr, 0, 320, "ResourceVariableClasses", 0};
     uint32_t rsrc_class_count = 0, rsrc_cmmap_count = 0, rsrc_mgr_count = 0, rsrc_var_class_count = 0;
 
   private:

@@ -223,7 +223,7 @@ void qecfg_compiler::release_storage(tbl *t) {
     if (!t || !t->tbl_base)
         return;
     std::free(t->tbl_base);
-    *t = tbl{nullptr, nullptr, nullptr, 0, nullptr, t->tbl_au, t->tbl_name, 0};
+    *t = tbl{nullptr, nullptr, nullptr, 0, t->tbl_au, t->tbl_name, 0};
 }
 
 void qecfg_compiler::add_rsrc_class_tbls() {

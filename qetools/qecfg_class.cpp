@@ -73,6 +73,8 @@ void qecfg_compiler::cmplt_class_tbl() {
     if (cb_rsrc_dattr.ra_cb_ID)
         cmplt_dattr_tbl();
     resolve_locator();
+    for (const class_table_def &d : class_tables)
+        release_if_empty(c.*d.field);
     append_record(&rsrc_class_tbl, c, rsrc_class_count);
     c.rc_cb_ID = 0;
 }

@@ -171,8 +171,12 @@ void file_sink::open_output() {
         throw sink_failure{CREATE, 0, "Output is the source file"};
     if (exists && !S_ISREG(st.st_mode))
         return open_in_place();
+    // A file this process may not write stays as protected as it was.
+    if (exists && faccessat(AT_FDCWD, target_.c_str(), W_OK, AT_EACCESS) != 0)
+        fail(CREATE, errno);
     replaces_ = exists;
-    old_ = st;
+    if (replaces_)
+        old_ = st;
     int err = create_temporary();
     if (err == EACCES || err == EPERM || err == EROFS)
         return open_in_place();

@@ -10,6 +10,7 @@
 namespace {
 constexpr size_t CHUNK = size_t(1) << 20;
 constexpr size_t OWN_BLOCK = CHUNK / 16; // larger requests get a block of their own
+constexpr size_t MIN_BLOCK = 16;
 constexpr size_t LARGE_TABLE = size_t(32) << 10;
 constexpr size_t LARGE_BLOCK = size_t(1) << 20;
 } // namespace
@@ -51,11 +52,24 @@ tbl *qecfg_compiler::new_tbl(const char *name, size_t au) {
     return t;
 }
 
+// A completed record's empty table is given back for new_tbl to reuse; its
+// reference becomes null, which the builder takes as an empty table. A
+// source of many small records then holds no table objects it does not use.
+void qecfg_compiler::release_if_empty(cdb_ref_t &ref) {
+    tbl *t = static_cast<tbl *>(ref.ptr);
+    if (!t || tbl_used(t))
+        return;
+    std::free(t->tbl_base);
+    *t = tbl{};
+    free_tbls.push_back(t);
+    ref.ptr = nullptr;
+}
+
 // Makes sure the block holds at least `need` bytes, moving it if it must.
 static bool reserve_block(tbl *t, size_t need) {
     if (need <= t->tbl_cap)
         return true;
-    size_t cap = t->tbl_cap ? t->tbl_cap : need;
+    size_t cap = std::max(t->tbl_cap, MIN_BLOCK);
     while (cap < need)
         cap = cap < (size_t(1) << 62) ? cap * 2 : need;
     // A table that has grown large jumps to a block that the allocator maps
@@ -68,47 +82,46 @@ static bool reserve_block(tbl *t, size_t need) {
     size_t used = t->tbl_next - t->tbl_base;
     t->tbl_base = nb;
     t->tbl_next = nb + used;
-    t->tbl_end = nb + t->tbl_size;
     t->tbl_cap = cap;
     return true;
 }
 
+// Tables keep growing in whole allocation units, as the traces report them,
+// but hold only the room their items use.
 void *qecfg_compiler::alloc_tble(tbl *t, size_t s) {
     bool trace = opt.debugLevel > 2;
     if (trace)
         QECFG_TRACE(*this, "alloc_tble: %s, structure size: %d\n", t->tbl_name, int(s));
     if (!t->tbl_base) {
         t->tbl_size = 0;
-        if (!reserve_block(t, t->tbl_au)) {
+        if (!reserve_block(t, std::max<size_t>(s, 1))) { // a table always has a block
             int e = errno;
             qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
         }
         t->tbl_size = t->tbl_au;
         t->tbl_next = t->tbl_prev_base = t->tbl_base;
-        t->tbl_end = t->tbl_base + t->tbl_size;
-        std::memset(t->tbl_base, 0, t->tbl_size);
         if (trace)
             QECFG_TRACE(*this, "alloc_tble: %s, table size: %d\n", t->tbl_name, int(t->tbl_size));
     }
-    if (s >= size_t(t->tbl_end - t->tbl_next)) {
+    size_t used = size_t(t->tbl_next - t->tbl_base);
+    if (s >= t->tbl_size - used) {
         // Grow by whole units, enough for the request alone; an exact fit grows too.
         size_t incr = s == 0 ? t->tbl_au : t->tbl_au * ((s + t->tbl_au - 1) / t->tbl_au);
         if (trace)
             std::fprintf(opt.trace_err, "alloc_tble: overflow by %d b. Adding %d b to %s\n", int(s), int(incr),
                          t->tbl_name);
-        char *old_base = t->tbl_base;
-        if (!reserve_block(t, t->tbl_size + incr)) {
-            int e = errno;
-            qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
-        }
-        t->tbl_prev_base = old_base;
+        t->tbl_prev_base = t->tbl_base;
         t->tbl_size += incr;
-        t->tbl_end = t->tbl_base + t->tbl_size;
-        std::memset(t->tbl_next, 0, t->tbl_end - t->tbl_next);
         if (trace)
             QECFG_TRACE(*this, "alloc_tble: %s, new table size: %d\n", t->tbl_name, int(t->tbl_size));
     }
+    if (!reserve_block(t, used + s)) {
+        int e = errno;
+        qecfg_error_exit_rtn(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
+    }
+    // Items are handed out zero-filled; the room behind them is left untouched.
     char *item = t->tbl_next;
+    std::memset(item, 0, s);
     t->tbl_next += s;
     return item;
 }

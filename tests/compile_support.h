@@ -1,23 +1,23 @@
 // Compiling a source given as a string in-process, with its traces, its
-// fatal message and its output file captured.
+// fatal message and its image captured.
 #ifndef COMPILE_SUPPORT_H
 #define COMPILE_SUPPORT_H
 
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <sstream>
 #include <string>
+#include <vector>
 
 #include "qecfg.h"
+#include "qecfg/qecfg.h"
 
 struct compile_result {
     int code = 0;        // 0, or the exit status of the fatal condition
     std::string message; // the fatal message
     std::string out;     // traces on standard output
     std::string err;     // traces on standard error
-    std::string cdb;     // the output file, when there is one
+    std::string cdb;     // the image, when there is one
     bool has_output = false;
 };
 
@@ -41,42 +41,27 @@ class captured_stream {
     FILE *f_;
 };
 
-// Compiles `source` to `<tmp>/<out_name>`; `setup` may change the options.
-template <typename F = void (*)(qecfg_options &)>
-compile_result compile_text(const std::string &source, F setup = [](qecfg_options &) {},
+// Compiles `source` in memory, as a source named "input.src" whose unnamed
+// class is named after `out_name`; `setup` may change the options.
+template <typename F = void (*)(qecfg::options &)>
+compile_result compile_text(const std::string &source, F setup = [](qecfg::options &) {},
                             const std::string &out_name = "out.cdef") {
-    namespace fs = std::filesystem;
-    static int serial = 0;
-    fs::path dir = fs::temp_directory_path() / ("qecfg-unit-" + std::to_string(getpid()) + "-" + std::to_string(serial++));
-    fs::create_directories(dir);
-    fs::path src = dir / "input.src", out = dir / out_name;
-    std::ofstream(src, std::ios::binary) << source;
     captured_stream so, se;
-    qecfg_options opt;
-    opt.cdefsrc = src.string();
-    opt.cdefname = out.string();
+    qecfg::options opt;
+    opt.output_name = out_name;
     opt.trace_out = so.file();
     opt.trace_err = se.file();
     setup(opt);
-    compile_result r;
     setenv("ZU_CDB_FORCE_EMPTY_TIMESTAMP", "1", 1);
-    try {
-        qecfg_compiler c(opt);
-        c.run();
-    } catch (const qecfg_fatal &f) {
-        r.code = f.code;
-        r.message = f.message;
-    }
+    std::vector<std::uint8_t> image;
+    qecfg::result res = qecfg::compile_to_memory(qecfg::source::bytes("input.src", source), image, opt);
+    compile_result r;
+    r.code = res.status;
+    r.message = res.message;
     r.out = so.text();
     r.err = se.text();
-    if (fs::exists(out)) {
-        std::ifstream in(out, std::ios::binary);
-        std::ostringstream s;
-        s << in.rdbuf();
-        r.cdb = s.str();
-        r.has_output = true;
-    }
-    fs::remove_all(dir);
+    r.cdb.assign(image.begin(), image.end());
+    r.has_output = res.status == 0;
     return r;
 }
 

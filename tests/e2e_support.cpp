@@ -1,5 +1,6 @@
 #include "e2e_support.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <fcntl.h>
@@ -36,6 +37,18 @@ static std::vector<std::string> lines(const std::string &text) {
         if (!s.empty())
             l.push_back(s);
     return l;
+}
+
+std::vector<fs::path> all_sources() {
+    std::vector<fs::path> v;
+    for (const auto &e : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples"))
+        if (e.path().extension() == ".src")
+            v.push_back(e.path());
+    for (const auto &d : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "tests" / "e2e"))
+        if (fs::exists(d.path() / "input.src"))
+            v.push_back(d.path() / "input.src");
+    std::sort(v.begin(), v.end());
+    return v;
 }
 
 run_result run(const fs::path &work, const std::string &program, const std::vector<std::string> &args,

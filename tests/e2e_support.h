@@ -34,6 +34,9 @@ void remove_run(const run_result &r);
 // Failures of the case's checks and of the general file checks.
 std::vector<std::string> check_outputs(const std::filesystem::path &dir, const std::filesystem::path &work);
 
+// Every example source and every case's input.src, in order of their paths.
+std::vector<std::filesystem::path> all_sources();
+
 // The general properties of a CDB: its length field and its checksum.
 std::vector<std::string> check_cdb(const std::string &bytes, bool swapped);
 

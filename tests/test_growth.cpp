@@ -2,7 +2,10 @@
 // compiles into the records and bodies it describes.
 #include <gtest/gtest.h>
 
-#include "compile_support.h"
+#include <sys/resource.h>
+#include <sys/wait.h>
+
+#include "output_support.h"
 
 namespace {
 
@@ -73,6 +76,38 @@ TEST(Growth, ACountHoldsAtMost65535Records) {
     EXPECT_EQ(over.message, "Too many records in table: ClassPattrsC\n");
     EXPECT_EQ(over.code, 1);
     EXPECT_FALSE(over.has_output);
+}
+
+// Peak memory follows what a source holds, not how many records it has: a
+// compile stays within twice its output and 32 MB, however small its records.
+struct PeakMemory : output_test::OutputDir {
+    long peak_kb(const std::string &source) {
+        write("input.src", source);
+        int status = 0;
+        struct rusage ru {};
+        wait4(output_test::start_qecfg(work), &status, 0, &ru);
+        EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+        return ru.ru_maxrss;
+    }
+};
+
+TEST_F(PeakMemory, ManySmallRecordsStayWithinTwiceTheOutput) {
+#if defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizer runtime's own memory hides the compiler's";
+#else
+    std::string bare_classes, variable_classes = BASE_SOURCE;
+    for (int i = 0; i < 100000; i++)
+        bare_classes += "ControlDefinition\n";
+    bare_classes += BASE_SOURCE.substr(BASE_SOURCE.find("ClassToManagerMapping"));
+    for (int i = 0; i < 50000; i++)
+        variable_classes += "ResourceVariableClass\n    VariableClass=V" + std::to_string(i) +
+                            "\n    ObservationInterval=60\n    ReportingInterval=60\n";
+    for (const std::string *source : {&bare_classes, &variable_classes}) {
+        long peak = peak_kb(*source);
+        long bound = long(2 * output_test::fs::file_size(work / "out.cdef") / 1024) + 32 * 1024;
+        EXPECT_LE(peak, bound) << output_test::fs::file_size(work / "out.cdef") << "-byte output";
+    }
+#endif
 }
 
 } // namespace

@@ -79,7 +79,7 @@ TEST(Reader, UnterminatedLastLineIsRead) {
 }
 
 TEST(Driver, OptionalStatementsAddNoMaskTrace) {
-    compile_result r = compile_text(BASE_SOURCE, [](qecfg_options &o) { o.debugLevel = 2; });
+    compile_result r = compile_text(BASE_SOURCE, [](qecfg::options &o) { o.trace_level = 2; });
     EXPECT_NE(r.out.find("ResourceClass: found attr: \"Name\", value: \"Test.Class\",length: 10\n"
                          "ClassToManagerMapping"),
               std::string::npos);

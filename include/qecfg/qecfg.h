@@ -82,7 +82,8 @@ result compile_to_memory(const source &src, std::vector<std::uint8_t> &image, co
 // same directory, flushed to disk when it replaces a file, given the old
 // file's permission bits (and owner and group, where allowed) and renamed
 // over the name. Any failure removes the temporary file and leaves the name
-// as it was. An output that is the source file itself is refused.
+// as it was. An output that is the source file itself is refused, and so is
+// an existing output that the process may not write.
 //
 // Where no temporary file can be created in the directory, or the output is
 // not a regular file (a FIFO, a device), the file is written in place; then a

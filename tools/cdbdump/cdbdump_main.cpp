@@ -108,7 +108,7 @@ int cdbdump_main(int argc, char **argv, FILE *out, FILE *err) {
             return 0;
         }
         if (a == "--version") {
-            std::fputs("cdbdump 1.0\n", out);
+            std::fputs("cdbdump " QECFG_VERSION "\n", out);
             return 0;
         }
         bool known = false;
