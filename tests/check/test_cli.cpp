@@ -80,7 +80,9 @@ TEST(CommandLine, EverySourceIsCheckedAndTheWorstStatusWins) {
 }
 
 TEST(Examples, CheckCleanly) {
-    for (const auto &f : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples")) {
+    for (const auto &f : fs::recursive_directory_iterator(fs::path(QECFG_SOURCE_DIR) / "examples")) {
+        if (f.path().extension() != ".src")
+            continue;
         check_run r = run_checker({"-Werror", f.path().string()});
         EXPECT_EQ(r.status, 0) << f.path();
         EXPECT_EQ(r.err, "");

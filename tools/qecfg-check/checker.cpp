@@ -13,7 +13,7 @@ namespace check {
 
 namespace {
 
-const char *VERSION = "qecfg-check 1.0\n";
+const char *VERSION = "qecfg-check " QECFG_VERSION "\n";
 const char *HELP = "usage: qecfg-check [options] SOURCE...\n"
                    "Compiles each class definition source in memory with qecfg's rules (no output file)\n"
                    "and reports its error, with the detail qecfg's message leaves out, and the warnings:\n"
