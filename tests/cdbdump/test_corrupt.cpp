@@ -94,17 +94,21 @@ const corruption corruptions[] = {
 
 // Everything a caller may do with any input: none of it may fail. The
 // printers, which only see verified files, run on every fourth input.
+// The streamed renderings are compared with those of the whole tree, the
+// listing in windows of a few bytes with the one of the whole walk.
 void exercise(const std::vector<uint8_t> &b, bool print) {
     annotation a = annotate_walk(b.data(), b.size());
     try {
         cdb_file f = verify(b.data(), b.size());
         if (!print) return;
-        (void)to_json(to_tree(f));
-        (void)to_text(to_tree(f));
+        EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::json), to_json(to_tree(f)));
+        EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::text), to_text(to_tree(f)));
         (void)decompile(f);
     } catch (const cdb_invalid &) {
     }
-    if (print) (void)annotation_text(b.data(), b.size(), a);
+    if (print) {
+        EXPECT_EQ(cdbtest::streamed_annotation(b, 700), annotation_text(b.data(), b.size(), a));
+    }
 }
 } // namespace
 

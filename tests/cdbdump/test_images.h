@@ -2,7 +2,9 @@
 #ifndef CDBDUMP_TEST_IMAGES_H
 #define CDBDUMP_TEST_IMAGES_H
 
+#include "cdb_annotate.h"
 #include "cdb_image.h"
+#include "cdb_to_tree.h"
 
 namespace cdbtest {
 
@@ -65,6 +67,20 @@ inline std::vector<uint8_t> rich_image(bool big) {
 
     c.action(false, "Reset", 3).put(40, c.sd_def({{"How", 2}}), 4);
     return image({c}, "Test.RM", {{"VC1", std::nullopt, {0x8001, 4}}});
+}
+
+// The renderings written while the image is walked, which must equal those
+// of the whole tree (and, for the listing, those of the unwindowed walk).
+inline std::string streamed(const std::vector<uint8_t> &b, cdbdump::tree_writer::style style) {
+    cdbdump::text_sink out;
+    cdbdump::write_file(b.data(), b.size(), cdbdump::verify(b.data(), b.size()), style, out);
+    return out.take();
+}
+
+inline std::string streamed_annotation(const std::vector<uint8_t> &b, size_t window) {
+    cdbdump::text_sink out;
+    cdbdump::write_annotation(b.data(), b.size(), out, window);
+    return out.take();
 }
 
 } // namespace cdbtest

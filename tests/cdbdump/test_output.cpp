@@ -1,7 +1,9 @@
 // The text, JSON and annotation renderings of a verified image.
 #include <algorithm>
 #include <cctype>
+#include <clocale>
 #include <cstring>
+#include <cuchar>
 #include <sstream>
 
 #include <gtest/gtest.h>
@@ -27,14 +29,38 @@ struct json_checker {
         i += n;
         return true;
     }
+    // Raw bytes must be UTF-8 (checked by the standard library's strict
+    // converter), escapes one of JSON's.
     bool string() {
         if (s[i++] != '"') return false;
+        size_t start = i;
         while (i < s.size() && s[i] != '"') {
             if (static_cast<unsigned char>(s[i]) < 0x20) return false;
-            if (s[i] == '\\') i++;
+            if (s[i] == '\\' && !escape()) return false;
             i++;
         }
-        return i++ < s.size();
+        return i < s.size() && utf8(s.substr(start, i - start)) && i++ < s.size();
+    }
+    bool escape() {
+        i++;
+        if (i < s.size() && std::strchr("\"\\/bfnrt", s[i])) return true;
+        if (i >= s.size() || s[i] != 'u' || i + 4 >= s.size()) return false;
+        for (int k = 1; k <= 4; k++)
+            if (!std::isxdigit(static_cast<unsigned char>(s[i + size_t(k)]))) return false;
+        i += 4;
+        return true;
+    }
+    static bool utf8(const std::string &bytes) {
+        std::mbstate_t state{};
+        const char *p = bytes.data(), *end = p + bytes.size();
+        while (p < end) {
+            char32_t c;
+            size_t n = std::mbrtoc32(&c, p, size_t(end - p), &state);
+            if (n == 0) n = 1;
+            if (n > size_t(end - p)) return false;
+            p += n;
+        }
+        return true;
     }
     bool number() {
         size_t start = i;
@@ -81,6 +107,33 @@ TEST(Output, JsonIsOneWellFormedDocument) {
                              "\"names\": [\"HasResources\", \"CanControl\", \"CanDefine\", \"JoinPhase1\"]",
                              "\"default_value\": \"0x00ff10\"", "\"low\": 5", "\"high\": [100]"})
         EXPECT_TRUE(has(j, part)) << part;
+}
+
+TEST(Output, JsonIsUtf8WhateverTheStringsHold) {
+    std::setlocale(LC_CTYPE, "C.UTF-8");
+    cdbtest::test_class c(false, "C\xff");
+    // A lone byte, a well-formed character, an encoded surrogate, a truncated sequence.
+    c.pattr(false, "Label", 1, 8).put(24, c.strings.text("\xe9t\xc3\xa9\xed\xa0\x80\xe2\x82"), 4);
+    std::vector<uint8_t> b = cdbtest::image({c});
+    std::string j = to_json(to_tree(verify(b.data(), b.size())));
+    EXPECT_TRUE(json_checker{j}.document()) << j;
+    EXPECT_FALSE(json_checker{std::string("[\"\xe9\"]")}.document()); // the checker refuses raw non-UTF-8
+    EXPECT_TRUE(has(j, "\"name\": \"C\\uf7ff\""));
+    EXPECT_TRUE(has(j, "\"default_value\": \"\\uf7e9t\xc3\xa9\\uf7ed\\uf7a0\\uf780\\uf7e2\\uf782\"")) << j;
+    // The text rendering keeps the bytes as stored.
+    EXPECT_TRUE(has(to_text(to_tree(verify(b.data(), b.size()))), "\"\xe9t\xc3\xa9\xed"));
+}
+
+TEST(Output, StreamedRenderingsEqualThoseOfTheWholeTree) {
+    for (bool big : {false, true}) {
+        std::vector<uint8_t> b = cdbtest::rich_image(big);
+        cdb_file f = verify(b.data(), b.size());
+        EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::json), to_json(to_tree(f)));
+        EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::text), to_text(to_tree(f)));
+        annotation a = annotate_walk(b.data(), b.size());
+        for (size_t window : {size_t(8), size_t(100), size_t(1) << 20})
+            EXPECT_EQ(cdbtest::streamed_annotation(b, window), annotation_text(b.data(), b.size(), a)) << window;
+    }
 }
 
 TEST(Output, JsonSpellsNonFiniteFloatsAsStrings) {

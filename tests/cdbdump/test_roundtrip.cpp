@@ -1,6 +1,7 @@
 // With the compiler: every example, every end-to-end source that compiles and
 // a source of awkward values decode; source -> CDB -> --source -> CDB keeps
-// the content; a reversed-byte-order CDB holds the same content.
+// the content; a reversed-byte-order CDB holds the same content; the streamed
+// renderings equal those of the whole tree.
 #include <sys/wait.h>
 
 #include <cstdlib>
@@ -12,6 +13,8 @@
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
 #include "cdb_walk.h"
+#include "test_dirs.h"
+#include "test_images.h"
 
 namespace fs = std::filesystem;
 using namespace cdbdump;
@@ -28,14 +31,7 @@ std::vector<fs::path> sources() {
     return found;
 }
 
-struct work_dir {
-    fs::path path;
-    work_dir() {
-        std::string tmpl = (fs::temp_directory_path() / "cdbdump_rt_XXXXXX").string();
-        path = mkdtemp(tmpl.data());
-    }
-    ~work_dir() { fs::remove_all(path); }
-};
+using cdbtest::work_dir;
 
 // Compiles in the work directory; the class name of an unnamed class then
 // comes from the same output name every time.
@@ -77,6 +73,10 @@ TEST(RoundTrip, SourceToCdbToSourceKeepsTheContent) {
         compiled++;
         cdb_file original;
         ASSERT_NO_THROW(original = read(w.path / "out.cdef"));
+        std::vector<uint8_t> bytes = bytes_of(w.path / "out.cdef");
+        EXPECT_EQ(cdbtest::streamed(bytes, tree_writer::style::json), to_json(to_tree(original)));
+        EXPECT_EQ(cdbtest::streamed(bytes, tree_writer::style::text), to_text(to_tree(original)));
+        EXPECT_EQ(cdbtest::streamed_annotation(bytes, 256), cdbtest::streamed_annotation(bytes, bytes.size()));
 
         decompiled d = decompile(original);
         for (const std::string &warning : d.warnings)

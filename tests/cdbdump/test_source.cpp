@@ -76,7 +76,12 @@ TEST(SourceText, NumbersThatConvertBackExactly) {
     EXPECT_EQ(number_source_text(6, 0x80000000), "-0");
     EXPECT_EQ(number_source_text(6, 0x000116c2), "9.9999461e-41"); // subnormal, accepted
     EXPECT_EQ(number_source_text(7, 0xfff0000000000000ull), "-inf");
-    EXPECT_EQ(number_source_text(6, 0x7fc00001), std::nullopt); // a NaN payload has no text
+    // NaNs keep their sign and payload; the conversion makes every NaN quiet.
+    EXPECT_EQ(number_source_text(6, 0x7fc00001), "nan(0x1)");
+    EXPECT_EQ(number_source_text(6, 0xffc00005), "-nan(0x5)");
+    EXPECT_EQ(number_source_text(7, 0xfff8000000012345ull), "-nan(0x12345)");
+    EXPECT_EQ(number_source_text(7, 0x7ff8000000000000ull), "nan");
+    EXPECT_EQ(number_source_text(6, 0x7f800001), std::nullopt); // signalling
 }
 
 TEST(Source, ReproducesWhatCompletionSupplied) {

@@ -138,10 +138,29 @@ template <typename F, typename B> bool reads_back(const std::string &text, B bit
 }
 } // namespace
 
+namespace {
+// A quiet NaN with a payload, in the form nan(0x...) that the conversion reads
+// back with its payload and sign; it always sets the quiet bit, so a
+// signalling NaN has no text.
+template <typename F, typename B> std::optional<std::string> nan_text(B bits) {
+    constexpr int mantissa_bits = sizeof(F) == 4 ? 23 : 52;
+    constexpr B quiet = B(1) << (mantissa_bits - 1), payload = quiet - 1;
+    std::string text = std::string(bits >> (8 * sizeof(B) - 1) ? "-" : "") + "nan(" + hex(bits & payload) + ")";
+    return reads_back<F>(text, bits) ? std::optional<std::string>(text) : std::nullopt;
+}
+
+template <typename F, typename B> std::optional<std::string> float_source_text(const std::string &text, B bits) {
+    if (reads_back<F>(text, bits)) return text;
+    F f;
+    std::memcpy(&f, &bits, sizeof f);
+    return std::isnan(f) ? nan_text<F>(bits) : std::nullopt;
+}
+} // namespace
+
 std::optional<std::string> number_source_text(uint32_t type, uint64_t bits) {
     std::string text = number_text(type, bits);
-    if (type == 6 && !reads_back<float>(text, uint32_t(bits))) return std::nullopt;
-    if (type == 7 && !reads_back<double>(text, bits)) return std::nullopt;
+    if (type == 6) return float_source_text<float>(text, uint32_t(bits));
+    if (type == 7) return float_source_text<double>(text, bits);
     return text;
 }
 

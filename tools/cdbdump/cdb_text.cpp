@@ -26,11 +26,28 @@ std::string hex_digits(const uint8_t *p, size_t n) {
 }
 
 namespace {
+// The length of the well-formed UTF-8 sequence at p (n bytes left), 0 when
+// there is none: no overlong forms, no surrogates, nothing above U+10FFFF.
+size_t utf8_length(const unsigned char *p, size_t n) {
+    unsigned char c = p[0];
+    size_t len = c >= 0xf0 ? 4 : c >= 0xe0 ? 3 : 2;
+    if (c < 0xc2 || c > 0xf4 || len > n) return 0;
+    for (size_t i = 1; i < len; i++)
+        if ((p[i] & 0xc0) != 0x80) return 0;
+    unsigned char second = p[1];
+    if ((c == 0xe0 && second < 0xa0) || (c == 0xed && second > 0x9f) || (c == 0xf0 && second < 0x90) ||
+        (c == 0xf4 && second > 0x8f))
+        return 0;
+    return len;
+}
+
 // Escapes shared by both quoting styles; the rest differs in how a control
-// byte is spelled.
-std::string quote_with(const std::string &s, const char *control_fmt) {
+// byte is spelled and in whether bytes from 0x80 up must form UTF-8.
+std::string quote_with(const std::string &s, const char *control_fmt, bool utf8_only) {
     std::string out = "\"";
-    for (unsigned char c : s) {
+    const auto *p = reinterpret_cast<const unsigned char *>(s.data());
+    for (size_t i = 0; i < s.size(); i++) {
+        unsigned char c = p[i];
         switch (c) {
         case '"': out += "\\\""; break;
         case '\\': out += "\\\\"; break;
@@ -42,8 +59,15 @@ std::string quote_with(const std::string &s, const char *control_fmt) {
                 char buf[8];
                 std::snprintf(buf, sizeof buf, control_fmt, c);
                 out += buf;
-            } else {
+            } else if (c < 0x80 || !utf8_only) {
                 out += char(c);
+            } else if (size_t len = utf8_length(p + i, s.size() - i)) {
+                out.append(s, i, len);
+                i += len - 1;
+            } else {
+                char buf[8];
+                std::snprintf(buf, sizeof buf, "\\u%04x", JSON_BYTE_ESCAPE_BASE + c);
+                out += buf;
             }
         }
     }
@@ -51,11 +75,9 @@ std::string quote_with(const std::string &s, const char *control_fmt) {
 }
 } // namespace
 
-std::string c_quote(const std::string &s) { return quote_with(s, "\\x%02x"); }
+std::string c_quote(const std::string &s) { return quote_with(s, "\\x%02x", false); }
 
-// Bytes from 0x80 up are passed through: a JSON reader that wants UTF-8 gets
-// exactly the bytes the file holds.
-std::string json_quote(const std::string &s) { return quote_with(s, "\\u%04x"); }
+std::string json_quote(const std::string &s) { return quote_with(s, "\\u%04x", true); }
 
 namespace {
 template <typename F> std::string special_float(F f) {

@@ -12,7 +12,11 @@ std::string hex(uint64_t v);                        // 0x2a
 std::string hexdec(uint64_t v);                     // 0x2a (42)
 std::string hex_digits(const uint8_t *p, size_t n); // 00ff10, no prefix
 std::string c_quote(const std::string &s);          // "a\tb", with C escapes
-std::string json_quote(const std::string &s);       // "a\tb", with JSON escapes
+// "a\tb", with JSON escapes; always UTF-8: a byte that is not part of a
+// well-formed UTF-8 sequence becomes the private-use character
+// JSON_BYTE_ESCAPE_BASE + byte (U+F780 to U+F7FF), written as an escape.
+std::string json_quote(const std::string &s);
+constexpr unsigned JSON_BYTE_ESCAPE_BASE = 0xf700;
 // The float text that reads back to the same bits: %.9g / %.17g, inf, nan.
 std::string float32_text(uint32_t bits);
 std::string float64_text(uint64_t bits);

@@ -4,6 +4,7 @@
 
 #include "cdb_names.h"
 #include "cdb_text.h"
+#include "cdb_walk.h"
 
 namespace cdbdump {
 
@@ -134,7 +135,8 @@ template <typename T, typename F> node list_node(const std::vector<T> &items, F 
     return a;
 }
 
-node class_node(const class_dsect &c) {
+// Everything of a class but its record lists.
+node class_fields(const class_dsect &c) {
     return node::object()
         .add("name", node::string(c.name))
         .add("alias", opt_string(c.alias))
@@ -150,13 +152,23 @@ node class_node(const class_dsect &c) {
         .add("undefine_sd", sd_node(c.undefine_sd))
         .add("online_sd", sd_node(c.online_sd))
         .add("offline_sd", sd_node(c.offline_sd))
-        .add("reset_sd", sd_node(c.reset_sd))
-        .add("persistent_class_attributes", list_node(c.pattrs_class, pattr_node))
-        .add("dynamic_class_attributes", list_node(c.dattrs_class, dattr_node))
-        .add("persistent_resource_attributes", list_node(c.pattrs, pattr_node))
-        .add("dynamic_resource_attributes", list_node(c.dattrs, dattr_node))
-        .add("class_actions", list_node(c.actions_class, action_node))
-        .add("resource_actions", list_node(c.actions, action_node));
+        .add("reset_sd", sd_node(c.reset_sd));
+}
+
+// Calls each(key, records, render) for the record lists of a class, in document order.
+template <typename F> void class_lists(const class_dsect &c, F each) {
+    each("persistent_class_attributes", c.pattrs_class, pattr_node);
+    each("dynamic_class_attributes", c.dattrs_class, dattr_node);
+    each("persistent_resource_attributes", c.pattrs, pattr_node);
+    each("dynamic_resource_attributes", c.dattrs, dattr_node);
+    each("class_actions", c.actions_class, action_node);
+    each("resource_actions", c.actions, action_node);
+}
+
+node class_node(const class_dsect &c) {
+    node n = class_fields(c);
+    class_lists(c, [&](const char *key, const auto &items, auto render) { n.add(key, list_node(items, render)); });
+    return n;
 }
 
 node manager_node(const mgr_dsect &m) {
@@ -193,9 +205,12 @@ node var_class_node(const var_class_dsect &v) {
         .add("variable_ids", ids);
 }
 
+node dsect_head(const anchor &a) {
+    return node::object().add("dsect", node::token(dsect_kind_name(a.type))).add("revision", node::uinteger(a.revision));
+}
+
 node dsect_node(const dsect &d, const anchor &a) {
-    node head =
-        node::object().add("dsect", node::token(dsect_kind_name(a.type))).add("revision", node::uinteger(a.revision));
+    node head = dsect_head(a);
     node body = std::visit(
         [](const auto &x) -> node {
             using T = std::decay_t<decltype(x)>;
@@ -211,6 +226,10 @@ node dsect_node(const dsect &d, const anchor &a) {
         d);
     for (const auto &m : body.members()) head.add(m.first, m.second);
     return head;
+}
+
+void add_members(tree_writer &w, const node &object) {
+    for (const auto &m : object.members()) w.member(m.first, m.second);
 }
 
 const char *const record_size_names[NUM_RECORD_SIZES] = {
@@ -235,7 +254,8 @@ node value_node(const value &v) {
     return node::null();
 }
 
-node to_tree(const cdb_file &f) {
+namespace {
+node file_head(const cdb_file &f) {
     node sizes = node::object();
     for (int i = 0; i < NUM_RECORD_SIZES; i++) sizes.add(record_size_names[i], node::uinteger(f.record_sizes[i]));
     node header = node::object()
@@ -246,15 +266,11 @@ node to_tree(const cdb_file &f) {
                       .add("max_class_id", node::uinteger(f.max_class_id))
                       .add("record_sizes", sizes);
     node anchors = node::array();
-    node dsects = node::array();
-    for (size_t i = 0; i < f.anchors.size(); i++) {
-        const anchor &a = f.anchors[i];
+    for (const anchor &a : f.anchors)
         anchors.push(node::object()
                          .add("type", node::token(dsect_kind_name(a.type)))
                          .add("offset", node::flags(a.offset))
                          .add("length", node::uinteger(a.length)));
-        if (i < f.dsects.size()) dsects.push(dsect_node(f.dsects[i], a));
-    }
     node layout = node::object()
                       .add("length", node::uinteger(f.length))
                       .add("checksum", node::flags(f.checksum))
@@ -262,8 +278,52 @@ node to_tree(const cdb_file &f) {
     return node::object()
         .add("byte_order", node::token(f.big_endian ? "big" : "little"))
         .add("header", header)
-        .add("layout", layout)
-        .add("dsects", dsects);
+        .add("layout", layout);
+}
+} // namespace
+
+node to_tree(const cdb_file &f) {
+    node dsects = node::array();
+    for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) dsects.push(dsect_node(f.dsects[i], f.anchors[i]));
+    return file_head(f).add("dsects", dsects);
+}
+
+namespace {
+void begin_file(tree_writer &w, const cdb_file &f) {
+    w.begin_object();
+    add_members(w, file_head(f));
+    w.begin_array("dsects", f.anchors.size());
+}
+
+// A class is written record by record, so that only one record's tree is held.
+void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
+    const auto *c = std::get_if<class_dsect>(&d);
+    if (!c) {
+        w.item(dsect_node(d, a));
+        return;
+    }
+    w.begin_object();
+    add_members(w, dsect_head(a));
+    add_members(w, class_fields(*c));
+    class_lists(*c, [&](const char *key, const auto &items, auto render) {
+        w.begin_array(key, items.size());
+        for (const auto &x : items) w.item(render(x));
+        w.end();
+    });
+    w.end();
+}
+
+void end_file(tree_writer &w) {
+    w.end();
+    w.end();
+}
+} // namespace
+
+void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out) {
+    tree_writer w(style, out);
+    begin_file(w, head);
+    verify_each(data, size, [&](size_t i, dsect &&d) { write_dsect(w, d, head.anchors[i]); });
+    end_file(w);
 }
 
 } // namespace cdbdump

@@ -12,6 +12,10 @@ namespace cdbdump {
 node to_tree(const cdb_file &f);
 node value_node(const value &v);
 
+// The whole document of a verified image, written while a walk reads the
+// dsects again, so that only one record's tree is ever held.
+void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out);
+
 } // namespace cdbdump
 
 #endif

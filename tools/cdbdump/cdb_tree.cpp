@@ -47,7 +47,7 @@ void json_into(const node &n, int indent, std::string &out) {
             out += flat ? (i ? " " : "") : "\n" + pad;
             json_into(n.items()[i], indent + 2, out);
         }
-        if (!flat && !n.items().empty()) out += "\n" + std::string(size_t(indent), ' ');
+        if (!flat && !n.items().empty()) out.append("\n").append(size_t(indent), ' ');
         out += "]";
         return;
     }
@@ -58,7 +58,7 @@ void json_into(const node &n, int indent, std::string &out) {
             out += pad + json_quote(n.members()[i].first) + ": ";
             json_into(n.members()[i].second, indent + 2, out);
         }
-        if (!n.members().empty()) out += "\n" + std::string(size_t(indent), ' ');
+        if (!n.members().empty()) out.append("\n").append(size_t(indent), ' ');
         out += "}";
         return;
     }
@@ -110,23 +110,26 @@ void text_member(const std::string &key, const node &v, size_t indent, std::stri
     text_into(v, indent + 2, out);
 }
 
+// One item of an array whose lines are indented by `indent`.
+void text_item(const node &item, size_t indent, std::string &out) {
+    std::string pad(indent, ' ');
+    std::string line = inline_text(item, TEXT_WIDTH - std::min(TEXT_WIDTH - 20, indent + 2));
+    if (!line.empty()) {
+        out += pad + "- " + line + "\n";
+        return;
+    }
+    // The item's block, with its first line marked as the start of an item.
+    std::string block;
+    text_into(item, indent + 2, block);
+    out += pad + "- " + block.substr(indent + 2);
+}
+
 void text_into(const node &n, size_t indent, std::string &out) {
     if (n.type() == node::kind::object) {
         for (const auto &m : n.members()) text_member(m.first, m.second, indent, out);
         return;
     }
-    std::string pad(indent, ' ');
-    for (const node &item : n.items()) {
-        std::string line = inline_text(item, TEXT_WIDTH - std::min(TEXT_WIDTH - 20, indent + 2));
-        if (!line.empty()) {
-            out += pad + "- " + line + "\n";
-            continue;
-        }
-        // The item's block, with its first line marked as the start of an item.
-        std::string block;
-        text_into(item, indent + 2, block);
-        out += pad + "- " + block.substr(indent + 2);
-    }
+    for (const node &item : n.items()) text_item(item, indent, out);
 }
 } // namespace
 
@@ -136,11 +139,111 @@ std::string to_json(const node &n) {
     return out + "\n";
 }
 
+std::string to_json_line(const node &n) {
+    switch (n.type()) {
+    case node::kind::null: return "null";
+    case node::kind::integer:
+    case node::kind::real: return n.text();
+    case node::kind::string:
+    case node::kind::token: return json_quote(n.text());
+    case node::kind::array: {
+        std::string s = "[";
+        for (const node &i : n.items()) {
+            if (s.size() > 1) s += ',';
+            s += to_json_line(i);
+        }
+        return s + "]";
+    }
+    default: {
+        std::string s = "{";
+        for (const auto &[key, v] : n.members()) {
+            if (s.size() > 1) s += ',';
+            s += json_quote(key);
+            s += ':';
+            s += to_json_line(v);
+        }
+        return s + "}";
+    }
+    }
+}
+
 std::string to_text(const node &n) {
     std::string out;
     if (is_scalar(n)) return scalar_text(n) + "\n";
     text_into(n, 0, out);
     return out;
+}
+
+
+// The indent of a frame is the one json_into or text_into would be given for
+// the node it stands for.
+void tree_writer::begin_object() {
+    if (open_.empty()) {
+        open_.push_back({false, 0, 0});
+    } else {
+        frame &a = open_.back();
+        if (style_ == style::json) out_ << (a.done ? ",\n" : "\n") << std::string(a.indent + 2, ' ');
+        a.done++;
+        open_.push_back({false, a.indent + 2, 0});
+        item_opening_ = style_ == style::text;
+    }
+    if (style_ == style::json) out_ << "{";
+}
+
+void tree_writer::next_member(const std::string &key) {
+    frame &o = open_.back();
+    if (style_ == style::json) out_ << (o.done ? ",\n" : "\n") << std::string(o.indent + 2, ' ') << json_quote(key) << ": ";
+    o.done++;
+}
+
+void tree_writer::member(const std::string &key, const node &value) {
+    size_t indent = open_.back().indent;
+    std::string s;
+    if (style_ == style::json) {
+        next_member(key);
+        json_into(value, int(indent + 2), s);
+    } else {
+        text_member(key, value, indent, s);
+        if (item_opening_) s.replace(indent - 2, 2, "- ");
+        item_opening_ = false;
+    }
+    out_ << s;
+}
+
+void tree_writer::begin_array(const std::string &key, size_t count) {
+    size_t indent = open_.back().indent;
+    if (style_ == style::json) {
+        next_member(key);
+        out_ << "[";
+    } else {
+        std::string s = std::string(indent, ' ') + key + (count ? ":\n" : ": []\n");
+        if (item_opening_) s.replace(indent - 2, 2, "- ");
+        item_opening_ = false;
+        out_ << s;
+    }
+    open_.push_back({true, indent + 2, 0});
+}
+
+void tree_writer::item(const node &n) {
+    frame &a = open_.back();
+    std::string s;
+    if (style_ == style::json) {
+        s = std::string(a.done ? ",\n" : "\n") + std::string(a.indent + 2, ' ');
+        json_into(n, int(a.indent + 2), s);
+    } else {
+        text_item(n, a.indent, s);
+    }
+    a.done++;
+    out_ << s;
+}
+
+void tree_writer::end() {
+    frame f = open_.back();
+    open_.pop_back();
+    if (style_ == style::text) return;
+    if (f.done) out_ << '\n' << std::string(f.indent, ' ');
+    out_ << (f.array ? "]" : "}");
+    if (open_.empty()) out_ << '\n';
 }
 
 } // namespace cdbdump

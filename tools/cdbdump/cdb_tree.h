@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+#include "cdb_sink.h"
+
 namespace cdbdump {
 
 class node {
@@ -55,6 +57,39 @@ class node {
 std::string to_json(const node &n);
 // An indented "key: value" rendering; short lists and records on one line.
 std::string to_text(const node &n);
+// JSON on one line, without blanks.
+std::string to_json_line(const node &n);
+
+// Writes a document in either rendering while it is built, byte for byte as
+// to_json or to_text of the whole tree would: an object given member by
+// member, where a member may be an array given item by item, whose items may
+// again be objects given member by member. Objects and array items given this
+// way must have more than three members, as records do (a whole node passed
+// to member or item may be anything).
+class tree_writer {
+  public:
+    enum class style { json, text };
+    tree_writer(style s, text_sink &out) : style_(s), out_(out) {}
+    // The document itself, or an item of the open array.
+    void begin_object();
+    void member(const std::string &key, const node &value);
+    // A member holding `count` items, each then given by item or begin_object.
+    void begin_array(const std::string &key, size_t count);
+    void item(const node &n);
+    // Closes the innermost object or array; closing the document ends it.
+    void end();
+
+  private:
+    struct frame {
+        bool array;
+        size_t indent, done;
+    };
+    void next_member(const std::string &key);
+    style style_;
+    text_sink &out_;
+    std::vector<frame> open_;
+    bool item_opening_ = false; // text: the next line starts an item ("- ")
+};
 
 } // namespace cdbdump
 

@@ -1,7 +1,9 @@
 // The walker's basics, the header, the anchors and the manager, map and
 // variable-class dsects.
 #include <algorithm>
+#include <cstdint>
 #include <cstring>
+#include <utility>
 
 #include "cdb.h"
 #include "cdb_names.h"
@@ -62,12 +64,12 @@ bool walker::check(bool ok, size_t off, const std::string &what) {
     if (ok) return true;
     if (!annotating_) throw cdb_invalid(off, what);
     violations_++;
-    spans_.push_back(span{off, 0, "", what, true});
+    if (in_window(off)) spans_.push_back(span{off, 0, "", what, true});
     return false;
 }
 
 void walker::emit(size_t off, size_t len, std::string field, std::string value) {
-    if (annotating_) spans_.push_back(span{off, len, std::move(field), std::move(value), false});
+    if (annotating_ && in_window(off)) spans_.push_back(span{off, len, std::move(field), std::move(value), false});
 }
 
 uint64_t walker::num(size_t off, unsigned width, const std::string &field) {
@@ -244,15 +246,19 @@ std::vector<bool> walker::walk_anchors(cdb_file &f) {
 
 void walker::walk_dsects(cdb_file &f, const std::vector<bool> &walkable) {
     for (size_t i = 0; i < walkable.size(); i++) {
-        if (!walkable[i]) continue;
         const anchor &a = f.anchors[i];
+        if (!walkable[i] || a.offset >= window_end_ || size_t(a.offset) + a.length < window_start_) continue;
+        pass_spans(a.offset);
+        // A dsect's lists, bodies and strings lie inside it, and dsects do not overlap.
+        claims_.clear();
+        string_lengths_.clear();
         std::string path = "dsect[" + std::to_string(i) + "]";
         try {
             switch (a.type) {
-            case CDB_DSECT_CLASS: f.dsects.emplace_back(walk_class(a, path)); break;
-            case CDB_DSECT_RSRC_MGR: f.dsects.emplace_back(walk_manager(a, path)); break;
-            case CDB_DSECT_CMMAP: f.dsects.emplace_back(walk_map(a, path)); break;
-            default: f.dsects.emplace_back(walk_var_class(a, path)); break;
+            case CDB_DSECT_CLASS: keep(f, walk_class(a, path)); break;
+            case CDB_DSECT_RSRC_MGR: keep(f, walk_manager(a, path)); break;
+            case CDB_DSECT_CMMAP: keep(f, walk_map(a, path)); break;
+            default: keep(f, walk_var_class(a, path)); break;
             }
         } catch (const read_past_end &e) {
             check(false, e.off, path + ": a read past the end of the file");
@@ -260,18 +266,28 @@ void walker::walk_dsects(cdb_file &f, const std::vector<bool> &walkable) {
     }
 }
 
-void walker::check_maxima(const cdb_file &f) {
-    uint16_t max_rm = 0, max_class = 0;
-    for (const dsect &d : f.dsects) {
-        if (auto *m = std::get_if<mgr_dsect>(&d)) max_rm = std::max(max_rm, m->id);
-        if (auto *c = std::get_if<class_dsect>(&d)) max_class = std::max(max_class, c->class_id);
-    }
-    check(f.max_rm_id == max_rm, 28,
+void walker::keep(cdb_file &f, dsect d) {
+    if (auto *m = std::get_if<mgr_dsect>(&d)) maxima_.rm_id = std::max(maxima_.rm_id, m->id);
+    if (auto *c = std::get_if<class_dsect>(&d)) maxima_.class_id = std::max(maxima_.class_id, c->class_id);
+    if (each_)
+        each_(maxima_.walked, std::move(d));
+    else
+        f.dsects.push_back(std::move(d));
+    maxima_.walked++;
+}
+
+void walker::pass_spans(size_t below) {
+    if (each_spans_) each_spans_(std::exchange(spans_, {}), below);
+}
+
+void walker::check_maxima(const cdb_file &f, const dsect_maxima &m) {
+    if (m.walked != f.anchors.size()) return;
+    check(f.max_rm_id == m.rm_id, 28,
           "cdb_hdr_max_rm_id is " + std::to_string(f.max_rm_id) + ", but the largest manager id is " +
-              std::to_string(max_rm));
-    check(f.max_class_id == max_class, 30,
+              std::to_string(m.rm_id));
+    check(f.max_class_id == m.class_id, 30,
           "cdb_hdr_max_class_id is " + std::to_string(f.max_class_id) + ", but the largest class id is " +
-              std::to_string(max_class));
+              std::to_string(m.class_id));
 }
 
 cdb_file walker::run() {
@@ -280,17 +296,20 @@ cdb_file walker::run() {
                "the file has " + std::to_string(n_) + " bytes, fewer than the " + std::to_string(CDB_HEADER_SIZE) +
                    " of a header")) {
         emit(0, n_, "truncated header", "");
+        pass_spans(n_);
         return f;
     }
     try {
         detect_order();
         walk_header(f);
         std::vector<bool> walkable = walk_anchors(f);
+        if (known_maxima_) check_maxima(f, *known_maxima_);
         walk_dsects(f, walkable);
-        if (f.dsects.size() == f.anchors.size()) check_maxima(f);
+        if (!known_maxima_) check_maxima(f, maxima_);
     } catch (const read_past_end &e) {
         check(false, e.off, "a read past the end of the file");
     }
+    pass_spans(SIZE_MAX);
     return f;
 }
 
@@ -412,10 +431,40 @@ cdb_file verify(const uint8_t *data, size_t size) {
     return w.run();
 }
 
+cdb_file verify_each(const uint8_t *data, size_t size, const dsect_consumer &each) {
+    walker w(data, size, false);
+    w.hand_dsects_to(each);
+    return w.run();
+}
+
 annotation annotate_walk(const uint8_t *data, size_t size) {
     walker w(data, size, true);
     w.run();
     return w.take_annotation();
+}
+
+// The listing must come in file order, but the walk reaches bodies after the
+// records that refer to them. So after a first walk, which keeps nothing but
+// finds the largest ids, the file is listed window by window: each walk
+// keeps the spans that start in its window only, and walks only the dsects
+// that reach into it.
+size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const span_consumer &each, size_t window) {
+    walker first(data, size, true);
+    first.hand_spans_to([](std::vector<span> &&, size_t) {});
+    first.hand_dsects_to([](size_t, dsect &&) {});
+    big_endian = first.run().big_endian;
+    size_t violations = first.take_annotation().violations;
+    for (size_t start = 0;; start += window) {
+        walker w(data, size, true);
+        bool last = size - start <= window;
+        w.set_window(start, last ? SIZE_MAX : start + window);
+        w.know_maxima(first.maxima());
+        w.hand_dsects_to([](size_t, dsect &&) {});
+        w.hand_spans_to(each);
+        w.run();
+        if (last) break;
+    }
+    return violations;
 }
 
 } // namespace cdbdump

@@ -2,6 +2,7 @@
 #ifndef CDBDUMP_CDB_WALKER_H
 #define CDBDUMP_CDB_WALKER_H
 
+#include <cstdint>
 #include <map>
 #include <optional>
 #include <string>
@@ -40,8 +41,22 @@ struct pending_range {
 class walker {
   public:
     walker(const uint8_t *data, size_t size, bool annotating) : d_(data), n_(size), annotating_(annotating) {}
+    // Each dsect goes to the consumer as soon as it is read instead of into the file's model.
+    void hand_dsects_to(dsect_consumer each) { each_ = std::move(each); }
+    // Spans go to the consumer in batches, each batch before the walk reaches the offset given with
+    // it, instead of being kept.
+    void hand_spans_to(span_consumer each) { each_spans_ = std::move(each); }
+    // The largest ids found by an earlier walk of the same image, so that the header's maxima are
+    // checked before the dsects are walked.
+    void know_maxima(const dsect_maxima &m) { known_maxima_ = m; }
+    // Keeps only the spans that start in [start, end), and walks only the dsects that reach into it.
+    void set_window(size_t start, size_t end) {
+        window_start_ = start;
+        window_end_ = end;
+    }
     cdb_file run();
     annotation take_annotation();
+    dsect_maxima maxima() const { return maxima_; }
 
   private:
     // --- basics (cdb_walk.cpp)
@@ -55,6 +70,7 @@ class walker {
     uint32_t ref(size_t off, const std::string &field);
     bool fits(const region &r, uint64_t off, uint64_t len) const { return off <= r.len && len <= r.len - off; }
     bool claimed(size_t off, size_t len) const;
+    bool in_window(size_t off) const { return off >= window_start_ && off < window_end_; }
     bool claim(size_t off, size_t len, size_t at, const std::string &what);
     std::optional<std::string> string_at(const region &r, uint32_t off, size_t at, const std::string &field);
     std::optional<std::string> string_ref(size_t at, const region &r, const std::string &field, bool none_allowed);
@@ -65,7 +81,9 @@ class walker {
     void walk_header(cdb_file &f);
     std::vector<bool> walk_anchors(cdb_file &f);
     void walk_dsects(cdb_file &f, const std::vector<bool> &walkable);
-    void check_maxima(const cdb_file &f);
+    void check_maxima(const cdb_file &f, const dsect_maxima &m);
+    void keep(cdb_file &f, dsect d);
+    void pass_spans(size_t below);
     mgr_dsect walk_manager(const anchor &a, const std::string &path);
     map_dsect walk_map(const anchor &a, const std::string &path);
     var_class_dsect walk_var_class(const anchor &a, const std::string &path);
@@ -108,6 +126,11 @@ class walker {
     size_t violations_ = 0;
     std::map<size_t, size_t> claims_;                   // start -> end of every list and value body reached
     std::unordered_map<size_t, size_t> string_lengths_; // strings already read, by file offset
+    dsect_consumer each_;
+    span_consumer each_spans_;
+    std::optional<dsect_maxima> known_maxima_;
+    dsect_maxima maxima_;
+    size_t window_start_ = 0, window_end_ = SIZE_MAX;
 };
 
 } // namespace cdbdump

@@ -1,23 +1,34 @@
 #include "cdbdump_main.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <iterator>
+#include <new>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "cdb_annotate.h"
+#include "cdb_diff.h"
+#include "cdb_input.h"
+#include "cdb_sink.h"
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
 #include "cdb_walk.h"
 
+using namespace cdbdump;
+
 namespace {
-const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n";
+const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
+                          "       cdbdump --diff | --compat [--json] OLD NEW\n";
 
 const char help_text[] = "NAME\n"
                          "    cdbdump - inspect, verify and decompile a class definition database (CDB)\n"
                          "\n"
                          "SYNOPSIS\n"
                          "    cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
+                         "    cdbdump --diff | --compat [--json] OLD NEW\n"
                          "\n"
                          "DESCRIPTION\n"
                          "    Reads the CDB in FILE (- for standard input), in either byte order, and\n"
@@ -37,66 +48,118 @@ const char help_text[] = "NAME\n"
                          "    --source     print a class definition source that the compiler turns\n"
                          "                 back into a CDB of the same content; what no source can\n"
                          "                 say is reported as a warning and as a comment in place\n"
+                         "    --diff       print the content differences of the CDBs OLD and NEW,\n"
+                         "                 keyed by names; layout, timestamp and byte order ignored\n"
+                         "    --compat     print the differences with the verdict of each: breaking\n"
+                         "                 when NEW would break what was stored or called with OLD\n"
+                         "                 (with --json: either as one JSON document)\n"
                          "    -h, --help   print this text\n"
                          "    --version    print the version\n"
                          "\n"
                          "EXIT STATUS\n"
-                         "    0  success\n"
-                         "    1  FILE is not a valid CDB (--annotate: violations were flagged)\n"
-                         "    2  a usage error, or FILE cannot be read\n";
+                         "    0  success (--diff: no difference; --compat: nothing breaks)\n"
+                         "    1  FILE is not a valid CDB (--annotate: violations were flagged;\n"
+                         "       --diff: the contents differ; --compat: a change breaks)\n"
+                         "    2  a usage error, FILE cannot be read, the output cannot be written,\n"
+                         "       or memory is exhausted\n";
 
-enum class mode { text, check, json, annotate, source };
+enum class mode { text, check, json, annotate, source, diff, compat };
+
+struct command {
+    mode m = mode::text;
+    bool json = false; // --json beside --diff or --compat
+    std::vector<std::string> operands;
+};
 
 int usage_error(FILE *err, const std::string &what) {
     std::fprintf(err, "cdbdump: %s\n%s", what.c_str(), usage_line);
     return 2;
 }
 
-bool read_all(FILE *in, std::vector<uint8_t> &bytes) {
-    uint8_t buf[65536];
-    size_t got;
-    while ((got = std::fread(buf, 1, sizeof buf, in)) > 0) bytes.insert(bytes.end(), buf, buf + got);
-    return !std::ferror(in);
+std::string display_name(const std::string &path) { return path == "-" ? "(standard input)" : path; }
+
+// Text such as a source file: printable bytes, tabs and line ends only.
+bool looks_like_text(const uint8_t *data, size_t size) {
+    size_t n = std::min<size_t>(size, 512);
+    for (size_t i = 0; i < n; i++)
+        if (!(data[i] >= 0x20 && data[i] < 0x7f) && data[i] != '\t' && data[i] != '\n' && data[i] != '\r')
+            return false;
+    return n > 0;
 }
 
-int run(mode m, const std::string &name, const std::vector<uint8_t> &bytes, FILE *out, FILE *err) {
-    if (m == mode::annotate) {
-        cdbdump::annotation a = cdbdump::annotate_walk(bytes.data(), bytes.size());
-        std::fputs(cdbdump::annotation_text(bytes.data(), bytes.size(), a).c_str(), out);
-        return a.violations ? 1 : 0;
+int report_invalid(FILE *err, const std::string &name, size_t offset, const std::string &message,
+                   const input_file &in) {
+    std::fprintf(err, "%s: offset %zu: %s\n", name.c_str(), offset, message.c_str());
+    if (looks_like_text(in.data(), in.size()))
+        std::fprintf(err, "%s: this looks like a class definition source, not a CDB; qecfg compiles it into one\n",
+                     name.c_str());
+    return 1;
+}
+
+// Loads the file; on failure reports it and gives the exit status.
+std::optional<int> load(input_file &in, const std::string &path, FILE *err) {
+    std::string name = display_name(path);
+    switch (in.load(path)) {
+    case input_file::outcome::loaded: return std::nullopt;
+    case input_file::outcome::unreadable:
+        std::fprintf(err, "cdbdump: %s: %s\n", name.c_str(), in.error().c_str());
+        return 2;
+    default: return report_invalid(err, name, in.refused_at(), in.error(), in);
     }
-    cdbdump::cdb_file f;
+}
+
+int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
+    input_file in;
+    if (auto status = load(in, path, err)) return *status;
+    if (m == mode::annotate) return write_annotation(in.data(), in.size(), out) ? 1 : 0;
+    std::string name = display_name(path);
     try {
-        f = cdbdump::verify(bytes.data(), bytes.size());
-    } catch (const cdbdump::cdb_invalid &e) {
-        std::fprintf(err, "%s: offset %zu: %s\n", name.c_str(), e.offset, e.message.c_str());
-        return 1;
-    }
-    switch (m) {
-    case mode::check: break;
-    case mode::json: std::fputs(cdbdump::to_json(cdbdump::to_tree(f)).c_str(), out); break;
-    case mode::source: {
-        cdbdump::decompiled d = cdbdump::decompile(f);
-        std::fputs(d.text.c_str(), out);
-        for (const std::string &w : d.warnings) std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
-        break;
-    }
-    default: std::fputs(cdbdump::to_text(cdbdump::to_tree(f)).c_str(), out); break;
+        if (m == mode::source) {
+            decompiled d = decompile(verify(in.data(), in.size()));
+            out << d.text;
+            for (const std::string &w : d.warnings) std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
+            return 0;
+        }
+        cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
+        if (m != mode::check)
+            write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
+    } catch (const cdb_invalid &e) {
+        return report_invalid(err, name, e.offset, e.message, in);
     }
     return 0;
 }
-} // namespace
 
-int cdbdump_main(int argc, char **argv, FILE *out, FILE *err) {
-    const std::pair<const char *, mode> modes[] = {
-        {"--check", mode::check}, {"--json", mode::json}, {"--annotate", mode::annotate}, {"--source", mode::source}};
-    mode m = mode::text;
+// Both files verified whole; their trees are compared.
+int compare(const command &c, text_sink &out, FILE *err) {
+    cdb_file files[2];
+    for (int i = 0; i < 2; i++) {
+        input_file in;
+        if (auto status = load(in, c.operands[size_t(i)], err)) return *status;
+        try {
+            files[i] = verify(in.data(), in.size());
+        } catch (const cdb_invalid &e) {
+            report_invalid(err, display_name(c.operands[size_t(i)]), e.offset, e.message, in);
+            return 2;
+        }
+    }
+    std::vector<change> changes = diff(files[0], files[1]);
+    bool compat = c.m == mode::compat;
+    if (compat) judge(changes);
+    write_changes(out, changes, c.json, compat);
+    if (!compat) return changes.empty() ? 0 : 1;
+    return std::any_of(changes.begin(), changes.end(), [](const change &x) { return x.breaking; }) ? 1 : 0;
+}
+
+// Parses the options; a status when the command ends here (help, version, usage error).
+std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE *err) {
+    const std::pair<const char *, mode> modes[] = {{"--check", mode::check},   {"--json", mode::json},
+                                                   {"--annotate", mode::annotate}, {"--source", mode::source},
+                                                   {"--diff", mode::diff},     {"--compat", mode::compat}};
     bool mode_given = false, options_done = false;
-    std::vector<std::string> operands;
     for (int i = 1; i < argc; i++) {
         std::string a = argv[i];
         if (options_done || a == "-" || a.empty() || a[0] != '-') {
-            operands.push_back(a);
+            c.operands.push_back(a);
             continue;
         }
         if (a == "--") {
@@ -104,37 +167,55 @@ int cdbdump_main(int argc, char **argv, FILE *out, FILE *err) {
             continue;
         }
         if (a == "-h" || a == "--help") {
-            std::fputs(help_text, out);
+            out << help_text;
             return 0;
         }
         if (a == "--version") {
-            std::fputs("cdbdump " QECFG_VERSION "\n", out);
+            out << "cdbdump " QECFG_VERSION "\n";
             return 0;
         }
-        bool known = false;
-        for (const auto &[opt, mm] : modes)
-            if (a == opt) {
-                if (mode_given) return usage_error(err, "only one of --check, --json, --annotate and --source");
-                m = mm;
-                mode_given = known = true;
-            }
-        if (!known) return usage_error(err, "unknown option " + a);
+        const auto *known = std::find_if(std::begin(modes), std::end(modes), [&](const auto &x) { return a == x.first; });
+        if (known == std::end(modes)) return usage_error(err, "unknown option " + a);
+        mode mm = known->second;
+        bool comparing = c.m == mode::diff || c.m == mode::compat || mm == mode::diff || mm == mode::compat;
+        if (mode_given && comparing && (mm == mode::json || c.m == mode::json) && !c.json) {
+            c.json = true;
+            if (mm != mode::json) c.m = mm;
+            continue;
+        }
+        if (mode_given)
+            return usage_error(err, "only one of --check, --json, --annotate, --source, --diff and --compat "
+                                    "(--json may go with --diff or --compat)");
+        c.m = mm;
+        mode_given = true;
     }
-    if (operands.size() != 1) return usage_error(err, operands.empty() ? "no FILE given" : "more than one FILE given");
-    std::vector<uint8_t> bytes;
-    const std::string &path = operands[0];
-    bool from_stdin = path == "-";
-    FILE *in = from_stdin ? stdin : std::fopen(path.c_str(), "rb");
-    std::string name = from_stdin ? "(standard input)" : path;
-    if (!in) {
-        std::fprintf(err, "cdbdump: %s: cannot open: %s\n", name.c_str(), std::strerror(errno));
+    size_t wanted = c.m == mode::diff || c.m == mode::compat ? 2 : 1;
+    if (c.operands.size() < wanted) return usage_error(err, c.operands.empty() ? "no FILE given" : "too few FILEs given");
+    if (c.operands.size() > wanted)
+        return usage_error(err, wanted == 1 ? "more than one FILE given" : "more than two FILEs given");
+    return std::nullopt;
+}
+
+int run(int argc, char **argv, text_sink &out, FILE *err) {
+    command c;
+    if (auto status = parse(argc, argv, c, out, err)) return *status;
+    if (c.m == mode::diff || c.m == mode::compat) return compare(c, out, err);
+    return inspect(c.m, c.operands[0], out, err);
+}
+} // namespace
+
+int cdbdump_main(int argc, char **argv, FILE *out, FILE *err) {
+    text_sink sink(out);
+    int status;
+    try {
+        status = run(argc, argv, sink, err);
+    } catch (const std::bad_alloc &) {
+        std::fputs("cdbdump: out of memory\n", err);
         return 2;
     }
-    bool ok = read_all(in, bytes);
-    if (!from_stdin) std::fclose(in);
-    if (!ok) {
-        std::fprintf(err, "cdbdump: %s: cannot read\n", name.c_str());
+    if (!sink.finish()) {
+        std::fprintf(err, "cdbdump: cannot write the output: %s\n", std::strerror(sink.error()));
         return 2;
     }
-    return run(m, name, bytes, out, err);
+    return status;
 }

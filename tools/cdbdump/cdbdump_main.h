@@ -5,7 +5,10 @@
 #include <cstdio>
 
 // Exit status: 0 success, 1 a file that is not a valid CDB (with --annotate:
-// one with violations), 2 a usage error or a file that cannot be read.
+// one with violations; --diff: contents that differ; --compat: a change that
+// breaks), 2 a usage error, a file that cannot be read, output that cannot be
+// written (every write to `out` is checked, and its final flush), or memory
+// exhausted.
 int cdbdump_main(int argc, char **argv, FILE *out, FILE *err);
 
 #endif

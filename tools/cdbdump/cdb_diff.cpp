@@ -1,0 +1,320 @@
+#include "cdb_diff.h"
+
+#include <algorithm>
+#include <map>
+
+#include "cdb_text.h"
+#include "cdb_to_tree.h"
+
+namespace cdbdump {
+
+namespace {
+using path_t = std::vector<std::string>;
+
+bool same(const node &a, const node &b) { return to_json_line(a) == to_json_line(b); }
+
+const node *member(const node &n, const std::string &key) {
+    for (const auto &m : n.members())
+        if (m.first == key) return &m.second;
+    return nullptr;
+}
+
+std::string raw_name(const node &item) {
+    const node *name = member(item, "name");
+    return name ? name->text() : "";
+}
+
+// Keys made unique by their occurrence: a second "A" is "A" #2.
+std::vector<std::string> unique(std::vector<std::string> keys) {
+    std::map<std::string, int> seen;
+    for (std::string &k : keys)
+        if (int n = ++seen[k]; n > 1) k += " #" + std::to_string(n);
+    return keys;
+}
+
+// The named items of a list as path segments: quoted names, made unique.
+std::vector<std::string> item_keys(const node &list) {
+    std::vector<std::string> keys;
+    for (const node &i : list.items()) keys.push_back(c_quote(raw_name(i)));
+    return unique(keys);
+}
+
+// Lists of named records: compared by name. The order of a structured-data
+// definition is its content; that of attributes and actions is not.
+bool keyed(const node &list) {
+    for (const node &i : list.items()) {
+        const node *name = i.type() == node::kind::object ? member(i, "name") : nullptr;
+        if (!name || name->type() != node::kind::string) return false;
+    }
+    return true;
+}
+
+bool order_matters(const std::string &key) {
+    for (const char *sd : {"define_sd", "undefine_sd", "online_sd", "offline_sd", "reset_sd", "sd", "sd_input",
+                           "sd_response"})
+        if (key == sd) return true;
+    return false;
+}
+
+path_t with(path_t p, std::string segment) {
+    p.push_back(std::move(segment));
+    return p;
+}
+
+class differ {
+  public:
+    std::vector<change> changes;
+
+    void compare(const node &a, const node &b, const path_t &path, const std::string &key) {
+        if (a.type() == node::kind::object && b.type() == node::kind::object) return objects(a, b, path);
+        if (a.type() == node::kind::array && b.type() == node::kind::array && keyed(a) && keyed(b))
+            return lists(a, b, path, order_matters(key));
+        if (!same(a, b)) changes.push_back(change{change::kind::changed, path, a, b, false, ""});
+    }
+
+    void objects(const node &a, const node &b, const path_t &path) {
+        for (const auto &[key, v] : a.members()) {
+            const node *w = member(b, key);
+            if (w)
+                compare(v, *w, with(path, key), key);
+            else
+                changes.push_back(change{change::kind::removed, with(path, key), v, node::null(), false, ""});
+        }
+        for (const auto &[key, w] : b.members())
+            if (!member(a, key)) changes.push_back(change{change::kind::added, with(path, key), node::null(), w, false, ""});
+    }
+
+    // Named items matched by name; path ends with the list's key.
+    void lists(const node &a, const node &b, const path_t &path, bool ordered) {
+        std::vector<std::string> keys_a = item_keys(a), keys_b = item_keys(b);
+        std::map<std::string, size_t> in_a, in_b;
+        for (size_t i = 0; i < keys_a.size(); i++) in_a[keys_a[i]] = i;
+        for (size_t i = 0; i < keys_b.size(); i++) in_b[keys_b[i]] = i;
+        node common_a = node::array(), common_b = node::array();
+        for (size_t i = 0; i < keys_a.size(); i++) {
+            const node &item = a.items()[i];
+            auto found = in_b.find(keys_a[i]);
+            if (found == in_b.end()) {
+                changes.push_back(change{change::kind::removed, with(path, keys_a[i]), item, node::null(), false, ""});
+                continue;
+            }
+            common_a.push(node::string(raw_name(item)));
+            compare(item, b.items()[found->second], with(path, keys_a[i]), "");
+        }
+        for (size_t i = 0; i < keys_b.size(); i++) {
+            const node &item = b.items()[i];
+            if (in_a.count(keys_b[i]))
+                common_b.push(node::string(raw_name(item)));
+            else
+                changes.push_back(change{change::kind::added, with(path, keys_b[i]), node::null(), item, false, ""});
+        }
+        if (ordered && !same(common_a, common_b))
+            changes.push_back(change{change::kind::reordered, path, common_a, common_b, false, ""});
+    }
+};
+
+// The dsect's key: its kind, and the name of a class or variable class.
+std::string dsect_key(const node &d) {
+    std::string kind = member(d, "dsect")->text();
+    const node *name = member(d, "name");
+    if (kind == "variable_class" && name->type() == node::kind::null) name = member(d, "alias");
+    if (kind == "manager" || kind == "map" || !name) return kind;
+    return kind + " " + (name->type() == node::kind::null ? "(unnamed)" : c_quote(name->text()));
+}
+
+// The content of a file as one object: the header without its timestamp,
+// then one member per dsect, keyed by dsect_key.
+node content(const cdb_file &f) {
+    node t = to_tree(f);
+    node header = *t.find("header");
+    header.erase("timestamp");
+    node c = node::object().add("header", header);
+    const std::vector<node> &dsects = t.find("dsects")->items();
+    std::vector<std::string> keys;
+    for (const node &d : dsects) keys.push_back(dsect_key(d));
+    keys = unique(keys);
+    for (size_t i = 0; i < dsects.size(); i++) {
+        node body = dsects[i];
+        body.erase("dsect");
+        c.add(keys[i], body);
+    }
+    return c;
+}
+} // namespace
+
+std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file) {
+    differ d;
+    d.objects(content(old_file), content(new_file), {});
+    return d.changes;
+}
+
+namespace {
+enum class family { other, attribute, action, sd_element };
+
+family family_of(const std::string &list) {
+    if (list.find("_attributes") != std::string::npos) return family::attribute;
+    if (list.find("_actions") != std::string::npos) return family::action;
+    return order_matters(list) ? family::sd_element : family::other;
+}
+
+bool is_name(const std::string &segment) { return !segment.empty() && segment[0] == '"'; }
+
+// The family of the named item the path ends in, or that owns its last member.
+family owner(const path_t &p, size_t name_at) {
+    return name_at >= 1 && name_at < p.size() && is_name(p[name_at]) ? family_of(p[name_at - 1]) : family::other;
+}
+
+void verdict(change &c, bool breaking, std::string reason) {
+    c.breaking = breaking;
+    c.reason = std::move(reason);
+}
+
+void judge_removal(change &c) {
+    const path_t &p = c.path;
+    if (p.size() == 1) return verdict(c, true, p[0].rfind("class ", 0) == 0 ? "a class was removed"
+                                                                           : "a dsect and what it held were removed");
+    switch (owner(p, p.size() - 1)) {
+    case family::attribute: return verdict(c, true, "an attribute was removed");
+    case family::action: return verdict(c, true, "an action was removed");
+    case family::sd_element: return verdict(c, true, "a structured-data element was removed");
+    default: return verdict(c, true, "an item was removed");
+    }
+}
+
+// Every old ID keeps its place; new ones may follow.
+bool ids_kept(const node &before, const node &after) {
+    if (before.type() != node::kind::array || after.type() != node::kind::array) return false;
+    const auto &a = before.items(), &b = after.items();
+    if (b.size() < a.size()) return false;
+    for (size_t i = 0; i < a.size(); i++)
+        if (!same(a[i], b[i])) return false;
+    return true;
+}
+
+void judge_change(change &c) {
+    // The member of the innermost named record (or of the dsect) that changed.
+    size_t record = 0;
+    for (size_t i = 1; i + 1 < c.path.size(); i++)
+        if (is_name(c.path[i])) record = i;
+    const std::string &field = c.path[std::min(record + 1, c.path.size() - 1)];
+    family f = owner(c.path, record);
+    if (field == "class_id") return verdict(c, true, "the class id changed");
+    if (field == "id" && f == family::attribute) return verdict(c, true, "an attribute id changed");
+    if (field == "id" && f == family::action) return verdict(c, true, "an action id changed");
+    if (field == "data_type" && f == family::attribute) return verdict(c, true, "a data type changed");
+    if (field == "data_type" && f == family::sd_element)
+        return verdict(c, true, "a structured-data element was retyped");
+    if (field == "variable_type") return verdict(c, true, "a variable type changed");
+    if (field == "variable_ids")
+        return ids_kept(c.before, c.after) ? verdict(c, false, "variable IDs were added")
+                                           : verdict(c, true, "a variable ID moved");
+    for (const char *text : {"description", "display_name", "group_name", "expression_description",
+                             "rearm_description", "range_description", "confirmation_message"})
+        if (field == text) return verdict(c, false, "a description or display name changed");
+    for (const char *value : {"default_value", "initial_value", "range", "valid_values"})
+        if (field == value) return verdict(c, false, "a default or range changed");
+    verdict(c, false, "nothing stored or called depends on it");
+}
+
+// The lists of a class an item left and joined tell what changed.
+std::string move_reason(const std::string &from, const std::string &to) {
+    bool persistence = (from.find("persistent") == 0) != (to.find("persistent") == 0);
+    bool scope = (from.find("class_") != std::string::npos) != (to.find("class_") != std::string::npos);
+    if (persistence && scope) return "persistence and class/resource scope changed";
+    return persistence ? "persistence changed" : "class/resource scope changed";
+}
+
+// A removed attribute or action whose name was added to another list of the
+// same class: one move.
+void pair_moves(std::vector<change> &changes) {
+    std::vector<bool> merged(changes.size(), false);
+    for (change &r : changes) {
+        if (r.what != change::kind::removed || r.path.size() != 3) continue;
+        family f = owner(r.path, 2);
+        if (f != family::attribute && f != family::action) continue;
+        for (size_t i = 0; i < changes.size(); i++) {
+            const path_t &q = changes[i].path;
+            if (merged[i] || changes[i].what != change::kind::added || q.size() != 3 || q[0] != r.path[0] ||
+                q[2] != r.path[2] || owner(q, 2) != f)
+                continue;
+            r.what = change::kind::moved;
+            r.before = node::token(r.path[1]);
+            r.after = node::token(q[1]);
+            verdict(r, true, move_reason(r.path[1], q[1]));
+            merged[i] = true;
+            break;
+        }
+    }
+    size_t kept = 0;
+    for (size_t i = 0; i < changes.size(); i++) {
+        if (merged[i]) continue;
+        if (kept != i) changes[kept] = std::move(changes[i]);
+        kept++;
+    }
+    changes.resize(kept);
+}
+
+const char *kind_name(change::kind k) {
+    switch (k) {
+    case change::kind::added: return "added";
+    case change::kind::removed: return "removed";
+    case change::kind::moved: return "moved";
+    case change::kind::reordered: return "reordered";
+    default: return "changed";
+    }
+}
+
+std::string path_text(const path_t &p) {
+    std::string s;
+    for (const std::string &segment : p) s += (s.empty() ? "" : " / ") + segment;
+    return s;
+}
+
+std::string change_line(const change &c, bool compat) {
+    std::string s = compat ? std::string(c.breaking ? "breaking: " : "compatible: ") : "";
+    s += std::string(kind_name(c.what)) + " " + path_text(c.path);
+    if (c.what != change::kind::added && c.what != change::kind::removed)
+        s += ": " + to_json_line(c.before) + " -> " + to_json_line(c.after);
+    return s + (compat ? " (" + c.reason + ")" : "") + "\n";
+}
+
+node change_node(const change &c, bool compat) {
+    node path = node::array();
+    for (const std::string &segment : c.path) path.push(node::string(segment));
+    node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
+    n.add("old", c.before).add("new", c.after);
+    if (compat) n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
+    return n;
+}
+} // namespace
+
+void judge(std::vector<change> &changes) {
+    pair_moves(changes);
+    for (change &c : changes) {
+        switch (c.what) {
+        case change::kind::removed: judge_removal(c); break;
+        case change::kind::added: verdict(c, false, "an addition"); break;
+        case change::kind::reordered: verdict(c, true, "structured-data elements were reordered"); break;
+        case change::kind::changed: judge_change(c); break;
+        case change::kind::moved: break;
+        }
+    }
+}
+
+void write_changes(text_sink &out, const std::vector<change> &changes, bool json, bool compat) {
+    if (!json) {
+        for (const change &c : changes) out << change_line(c, compat);
+        return;
+    }
+    bool breaks = std::any_of(changes.begin(), changes.end(), [](const change &c) { return c.breaking; });
+    node list = node::array();
+    for (const change &c : changes) list.push(change_node(c, compat));
+    node doc = node::object();
+    if (compat)
+        doc.add("compatible", node::real(breaks ? "false" : "true"));
+    else
+        doc.add("equal", node::real(changes.empty() ? "true" : "false"));
+    out << to_json(doc.add("changes", list));
+}
+
+} // namespace cdbdump
