@@ -84,8 +84,8 @@ constexpr std::array<unsigned char, 256> make_classes() {
 }
 constexpr std::array<unsigned char, 256> char_classes = make_classes();
 
-// Cuts comments and the newline off a piece; false when nothing is left to
-// process (a comment line or a line of blanks, tabs and quotes).
+} // namespace
+
 bool strip_comments(char *line) {
     int non_blank = 0, is_comment = 0, dbl_quote = 2;
     char *p = line;
@@ -130,6 +130,8 @@ bool strip_comments(char *line) {
         *--p = '\0';
     return true;
 }
+
+namespace {
 
 int find_stanza_type(const char *name) {
     for (int i = 0; i < NUM_STANZA_TYPES; i++)

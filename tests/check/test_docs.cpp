@@ -1,0 +1,133 @@
+// The reference, the manual page and the editor files against the keyword
+// table: every stanza type and statement row must be in each of them, and
+// every message the compiler can give must be explained in the reference.
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <fstream>
+#include <regex>
+#include <sstream>
+
+#include "docgen.h"
+#include "lang.h"
+
+namespace fs = std::filesystem;
+
+namespace {
+
+std::string read_source_file(const std::string &rel) {
+    std::ifstream in(fs::path(QECFG_SOURCE_DIR) / rel, std::ios::binary);
+    std::ostringstream s;
+    s << in.rdbuf();
+    return s.str();
+}
+
+// The text of the reference from a stanza's heading to the next heading.
+std::string stanza_section(const std::string &doc, const std::string &stanza) {
+    size_t start = doc.find("\n### " + stanza + "\n");
+    if (start == std::string::npos)
+        return "";
+    size_t end = doc.find("\n#", start + 1);
+    return doc.substr(start, end == std::string::npos ? std::string::npos : end - start);
+}
+
+TEST(Reference, EveryStanzaHasItsStatementTable) {
+    std::string doc = read_source_file("docs/language.md");
+    for (const lang::stanza_type &s : lang::stanza_types()) {
+        std::string section = stanza_section(doc, s.name);
+        ASSERT_FALSE(section.empty()) << "no section for " << s.name;
+        for (const lang::statement_row &r : s.rows) {
+            std::string row = "| `" + r.name + "` | " + (r.optional ? "optional" : "required") + " | " +
+                              (r.repeatable ? "yes" : "no") + " |";
+            EXPECT_NE(section.find(row), std::string::npos) << s.name << " lacks the row " << row;
+        }
+    }
+}
+
+TEST(Reference, EditorFilesNameEveryStanzaAndKeyword) {
+    struct editor_file {
+        const char *path;
+        std::string stanza_open, stanza_close, keyword_open, keyword_close;
+    };
+    const editor_file files[] = {
+        {"editors/vim/syntax/qecfg.vim", "qecfgStanza \"^\\%(", "\\)\\ze[ \\t]", "qecfgKey \"^[ \\t]\\+\\zs\\%(",
+         "\\)\\ze="},
+        {"editors/vscode/syntaxes/qecfg.tmLanguage.json", "\"match\": \"^(", ")[ \\\\t]",
+         "\"begin\": \"^([ \\\\t]+)(?:(", ")|([^=]*))"},
+    };
+    for (const editor_file &f : files) {
+        std::string text = read_source_file(f.path);
+        // The alternation of stanza names, and of keywords, as the file holds them.
+        size_t s0 = text.find(f.stanza_open), s1 = text.find(f.stanza_close, s0);
+        size_t k0 = text.find(f.keyword_open), k1 = text.find(f.keyword_close, k0);
+        ASSERT_TRUE(s0 != std::string::npos && s1 != std::string::npos && k0 != std::string::npos &&
+                    k1 != std::string::npos)
+            << f.path;
+        std::string stanzas = "|" + text.substr(s0 + f.stanza_open.size(), s1 - s0 - f.stanza_open.size()) + "|";
+        std::string keywords = "|" + text.substr(k0 + f.keyword_open.size(), k1 - k0 - f.keyword_open.size()) + "|";
+        for (std::string *alt : {&stanzas, &keywords})
+            *alt = std::regex_replace(*alt, std::regex(R"(\\\|)"), "|");
+        for (const lang::stanza_type &s : lang::stanza_types()) {
+            EXPECT_NE(stanzas.find("|" + s.name + "|"), std::string::npos) << f.path << " lacks " << s.name;
+            for (const lang::statement_row &r : s.rows)
+                EXPECT_NE(keywords.find("|" + r.name + "|"), std::string::npos) << f.path << " lacks " << r.name;
+        }
+    }
+}
+
+// Every message text the compiler passes to its error exits.
+std::vector<std::string> compiler_messages() {
+    std::vector<std::string> found;
+    std::regex call(R"((?:statement_error|qecfg_error_exit_rtn|bld_error_exit|output_error)\(\s*"([^"]+)\")");
+    for (const auto &f : fs::directory_iterator(fs::path(QECFG_SOURCE_DIR) / "qetools")) {
+        std::string text = read_source_file("qetools/" + f.path().filename().string());
+        for (std::sregex_iterator it(text.begin(), text.end(), call), end; it != end; ++it)
+            found.push_back((*it)[1]);
+    }
+    return found;
+}
+
+TEST(Reference, ExplainsEveryCompilerMessage) {
+    std::string doc = read_source_file("docs/language.md");
+    std::string messages = doc.substr(doc.find("\n## Messages"));
+    std::vector<std::string> all = compiler_messages();
+    EXPECT_GT(all.size(), 40u);
+    for (std::string m : all) {
+        // The usage texts are the command line's, not the language's.
+        if (m == "Usage: " || m == "usage: ")
+            continue;
+        while (!m.empty() && m.back() == ' ')
+            m.pop_back();
+        EXPECT_NE(messages.find(m), std::string::npos) << "unexplained message: " << m;
+    }
+}
+
+TEST(Generator, FillsBlocksAndReportsMissingAndUnknownOnes) {
+    std::string missing;
+    std::string text = "a\n<!-- generated: x -->\nold\n<!-- end generated -->\n<!-- generated: gone -->\n"
+                       "<!-- end generated -->\nb\n";
+    std::string out = docgen::fill_blocks(text, {{"x", "new\n"}, {"y", "why\n"}}, missing);
+    EXPECT_EQ(out, "a\n<!-- generated: x -->\nnew\n<!-- end generated -->\n<!-- generated: gone -->\n"
+                   "<!-- end generated -->\nb\n");
+    EXPECT_EQ(missing, "unknown block gone, y");
+    // Filling again changes nothing: the generator's output is a fixed point.
+    std::string again;
+    EXPECT_EQ(docgen::fill_blocks(out, {{"x", "new\n"}, {"gone", ""}}, again),
+              "a\n<!-- generated: x -->\nnew\n<!-- end generated -->\n<!-- generated: gone -->\n"
+              "<!-- end generated -->\nb\n");
+    EXPECT_EQ(again, "");
+}
+
+TEST(Generator, ManualPageEscapesRoffAndKeepsTables) {
+    std::string man =
+        docgen::man_page("# Title\n\n## Part one\n\n.dot `a\\b` text\n\n| A | B |\n|---|---|\n| `x` | y |\n\n"
+                         "```\n.code\\n\n```\n");
+    EXPECT_NE(man.find(".TH QECFG-SRC 5"), std::string::npos);
+    EXPECT_NE(man.find(".SH PART ONE\n"), std::string::npos);
+    EXPECT_NE(man.find("\\&.dot \\fBa\\eb\\fR text\n"), std::string::npos);
+    EXPECT_NE(man.find(".TS\nallbox;\nl lx.\nT{\nA\nT}\tT{\nB\nT}\nT{\n\\fBx\\fR\nT}\tT{\ny\nT}\n.TE\n"),
+              std::string::npos);
+    EXPECT_NE(man.find(".nf\n\\&.code\\en\n.fi\n"), std::string::npos);
+}
+
+} // namespace
