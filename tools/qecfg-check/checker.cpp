@@ -3,10 +3,9 @@
 
 #include <cerrno>
 #include <cstring>
-#include <fstream>
-#include <sstream>
 
 #include "qecfg/qecfg.h"
+#include "check_source.h"
 #include "warnings.h"
 
 namespace check {
@@ -122,67 +121,52 @@ std::string list_warnings(const settings &s) {
     return text;
 }
 
-// The output name qecfg is assumed to be given: the source's file name with
-// its extension replaced by .cdef.
-std::string default_output_name(const std::string &source) {
-    std::string base = source.substr(source.find_last_of('/') + 1);
-    size_t dot = base.find_last_of('.');
-    return (dot == std::string::npos || dot == 0 ? base : base.substr(0, dot)) + ".cdef";
-}
-
 std::string located(const std::string &file, const diagnostic &d) {
     return file + (d.line ? ":" + std::to_string(d.line) : "") + ": ";
 }
 
 bool read_text(const std::string &path, std::string &text) {
-    std::ifstream in(path, std::ios::binary);
-    std::ostringstream s;
-    s << in.rdbuf();
-    text = s.str();
-    return in.good() || in.eof();
+    std::FILE *f = std::fopen(path.c_str(), "rb");
+    if (!f)
+        return false;
+    char piece[65536];
+    size_t n;
+    while ((n = std::fread(piece, 1, sizeof piece, f)) > 0)
+        text.append(piece, n);
+    bool ok = !std::ferror(f);
+    std::fclose(f);
+    return ok;
 }
 
-// Compiles one source in memory, its traces discarded.
-qecfg::result compile(const std::string &path, const std::string &output_name) {
-    char *buf = nullptr;
-    size_t len = 0;
-    std::FILE *traces = open_memstream(&buf, &len);
+// Why a source that cannot be read was refused, in the compiler's words.
+std::string unreadable(const std::string &path) {
+    int read_errno = errno;
+    std::vector<std::uint8_t> image;
     qecfg::options opt;
     opt.message_newline = false;
-    opt.output_name = output_name;
-    if (traces)
-        opt.trace_out = opt.trace_err = traces;
-    std::vector<std::uint8_t> image;
     qecfg::result r = qecfg::compile_to_memory(qecfg::source::file(path), image, opt);
-    if (traces)
-        std::fclose(traces);
-    std::free(buf);
-    return r;
+    if (r.status == 0 || r.status == 1)
+        return std::string("cannot read because: ") + std::strerror(read_errno);
+    return r.message.rfind(path + ": ", 0) == 0 ? r.message.substr(path.size() + 2) : r.message;
 }
 
-status check_source(const std::string &path, const settings &s, writer &err) {
-    std::string output_name = s.output_name.empty() ? default_output_name(path) : s.output_name;
-    qecfg::result r = compile(path, output_name);
-    if (r.status != 0 && r.status != 1) { // the source cannot be read, or memory ran out
-        std::string why = r.message.rfind(path + ": ", 0) == 0 ? r.message.substr(path.size() + 2) : r.message;
-        err.put(path + ": error: " + why + "\n");
-        return TROUBLE;
-    }
+status check_file(const std::string &path, const settings &s, writer &err) {
     std::string text;
     if (!read_text(path, text)) {
-        err.put(path + ": error: cannot read because: " + std::strerror(errno) + "\n");
+        err.put(path + ": error: " + unreadable(path) + "\n");
         return TROUBLE;
     }
-    source_model m = read_model(text);
-    if (r.status == 1) {
-        diagnostic d = explain_failure(r.message, m);
-        err.put(located(path, d) + "error: " + d.text + "\n");
-        return FINDING;
+    check_report report = check_text(path, text, check_options{s.output_name, s.enabled});
+    for (const finding &f : report.findings) {
+        bool error = f.level == severity::error || s.werror;
+        err.put(located(path, f.where) + (error ? "error: " : "warning: ") + f.where.text +
+                (f.name.empty() ? "" : " [" + f.name + "]") + "\n");
+        for (const diagnostic &note : f.notes)
+            err.put(located(path, note) + "note: " + note.text + "\n");
     }
-    std::vector<warning_finding> found = run_warnings(m, warning_context{output_name}, s.enabled);
-    for (const warning_finding &f : found)
-        err.put(located(path, f.where) + (s.werror ? "error: " : "warning: ") + f.where.text + " [" + f.name + "]\n");
-    return s.werror && !found.empty() ? FINDING : CLEAN;
+    if (report.status != 0)
+        return report.status == 1 ? FINDING : TROUBLE;
+    return s.werror && !report.findings.empty() ? FINDING : CLEAN;
 }
 
 } // namespace
@@ -200,7 +184,7 @@ int checker_main(const std::vector<std::string> &args, std::FILE *out_file, std:
         out.put(list_warnings(s));
     } else if (!exit_now) {
         for (const std::string &path : s.sources)
-            result = std::max<int>(result, check_source(path, s, err));
+            result = std::max<int>(result, check_file(path, s, err));
     }
     bool written = out.finish();
     if (!err.finish() || !written)

@@ -1,0 +1,61 @@
+// The check of one source: one compile in memory, then the source model.
+#include "check_source.h"
+
+#include <cstdlib>
+
+#include "qecfg/qecfg.h"
+#include "warnings.h"
+
+namespace check {
+
+namespace {
+
+// Compiles one source in memory, its traces discarded.
+qecfg::result compile(const std::string &name, const std::string &text, const std::string &output_name) {
+    char *buf = nullptr;
+    size_t len = 0;
+    std::FILE *traces = open_memstream(&buf, &len);
+    qecfg::options opt;
+    opt.message_newline = false;
+    opt.output_name = output_name;
+    if (traces)
+        opt.trace_out = opt.trace_err = traces;
+    std::vector<std::uint8_t> image;
+    qecfg::result r = qecfg::compile_to_memory(qecfg::source::bytes(name, text), image, opt);
+    if (traces)
+        std::fclose(traces);
+    std::free(buf);
+    return r;
+}
+
+} // namespace
+
+std::string default_output_name(const std::string &source) {
+    std::string base = source.substr(source.find_last_of('/') + 1);
+    size_t dot = base.find_last_of('.');
+    return (dot == std::string::npos || dot == 0 ? base : base.substr(0, dot)) + ".cdef";
+}
+
+check_report check_text(const std::string &name, const std::string &text, const check_options &opt) {
+    std::string output_name = opt.output_name.empty() ? default_output_name(name) : opt.output_name;
+    qecfg::result r = compile(name, text, output_name);
+    check_report report;
+    report.status = r.status == 0 || r.status == 1 ? r.status : 2;
+    if (report.status == 2) {
+        std::string why = r.message.rfind(name + ": ", 0) == 0 ? r.message.substr(name.size() + 2) : r.message;
+        report.findings.push_back(finding{severity::error, diagnostic{0, why}, "", {}});
+        return report;
+    }
+    source_model m = read_model(text);
+    if (r.status == 1) {
+        report.findings.push_back(finding{severity::error, explain_failure(r.message, m), "", {}});
+        return report;
+    }
+    std::vector<bool> enabled = opt.enabled;
+    enabled.resize(warning_checks().size(), true);
+    for (warning_finding &f : run_warnings(m, warning_context{output_name}, enabled))
+        report.findings.push_back(finding{severity::warning, std::move(f.where), f.name, {}});
+    return report;
+}
+
+} // namespace check
