@@ -46,9 +46,17 @@ const error_case cases[] = {
     {"the second map", CLASS + MAP + "ClassToManagerMapping # here\n" + MAP.substr(MAP.find('\n') + 1),
      "Only one ClassToManagerMapping stanza allowed"},
     {"reversed keys",
-     CLASS + "ClassToManagerMapping\n    ResourceManager=R\n    FirstKey=9 # here\n    LastKey=5\n"
-             "    MessageCatalog=c\n    DescriptiveMessageSet=1\n",
-     "Error: FirstKey is greater than LastKey. (FirstKey=9, LastKey=5 on line 13)"},
+     CLASS + "ClassToManagerMapping\n    ResourceManager=R\n    FirstKey=9\n    LastKey=5\n"
+             "    MessageCatalog=c\n    DescriptiveMessageSet=1 # here: the map is completed at the end\n",
+     "Error: FirstKey is greater than LastKey. (FirstKey=9, LastKey=5 on line 13)\n"
+     "input.src:12: note: FirstKey is given here"},
+    {"an attribute element of no data type",
+     CLASS + MAP + PATTR.substr(0, PATTR.find("Int32")) + "SD\n    VarietyRange=1,1\n" +
+         "PAttrSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
+         "    DataType=Int23\nResourceAction # here: the element run ends\n",
+     "dump_dflt: copy_this_sd_type default error: the element 'e' of the PAttrSDDefinition definition on line 23 has "
+     "a DataType that names no data type, so the attribute's structured value cannot be built\n"
+     "input.src:28: note: DataType=Int23 names no data type; did you mean 'Int32'?"},
     {"the expected element index",
      CLASS + MAP +
          "DefineSDDefinition\n    ElementName=a\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
@@ -83,19 +91,21 @@ INSTANTIATE_TEST_SUITE_P(Cases, Error, ::testing::ValuesIn(cases));
 
 TEST(Error, IncompleteStanzaNamesItsMissingStatements) {
     // The resource attribute at line 16 lacks Id and stays open across the
-    // class attribute; the next resource attribute completes it.
+    // class attribute; the next resource attribute completes it, on line 29,
+    // where qecfg reports it.
     check_run r = check_text(CLASS + MAP + PATTR_HEAD + "    DataType=Int32\n    VarietyRange=1,1\n" +
                              "PersistentClassAttribute\n" + PATTR.substr(PATTR.find('\n') + 1) + PATTR);
-    EXPECT_EQ(r.err, "input.src:16: error: Previous stanza incomplete: the PersistentResourceAttribute stanza lacks Id "
-                     "(found at the stanza header on line 29)\n");
+    EXPECT_EQ(r.err,
+              "input.src:29: error: Previous stanza incomplete: the PersistentResourceAttribute stanza on line 16 "
+              "lacks Id\ninput.src:16: note: the incomplete PersistentResourceAttribute stanza starts here\n");
     // An action ends at the next stanza; at the end of the source the
     // structured-data element is completed first.
     r = check_text(
         CLASS + MAP + "ResourceAction\n    Name=a\n    Description=1\n    DisplayName=2\n    VarietyRange=1,1\n" +
         "ActionInSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n" +
         "    DataType=Int32\n");
-    EXPECT_EQ(r.err, "input.src:16: error: Previous stanza incomplete: the ResourceAction stanza lacks Id "
-                     "(found at the end of the source)\n");
+    EXPECT_EQ(r.err, "input.src:26: error: Previous stanza incomplete: the ResourceAction stanza on line 16 lacks Id\n"
+                     "input.src:16: note: the incomplete ResourceAction stanza starts here\n");
 }
 
 } // namespace

@@ -20,7 +20,7 @@ TEST(SourceModel, ReadsStanzasAndStatementsAsTheCompilerDoes) {
     ASSERT_EQ(m.stanzas.size(), 2u);
     const check::stanza &rc = m.stanzas[0];
     EXPECT_EQ(rc.line, 2);
-    EXPECT_TRUE(rc.is("ResourceClass"));
+    EXPECT_TRUE(rc.is(ST_RESOURCE_CLASS));
     ASSERT_EQ(rc.statements.size(), 4u);
     struct expected {
         int line;
@@ -34,14 +34,15 @@ TEST(SourceModel, ReadsStanzasAndStatementsAsTheCompilerDoes) {
     for (size_t i = 0; i < 4; i++) {
         const check::statement &st = rc.statements[i];
         EXPECT_EQ(st.line, rows[i].line);
-        EXPECT_EQ(st.keyword, rows[i].keyword);
-        EXPECT_EQ(st.value, rows[i].value);
+        EXPECT_EQ(st.keyword(), rows[i].keyword);
+        EXPECT_EQ(st.value(), rows[i].value);
         EXPECT_EQ(st.skipped, rows[i].skipped);
-        EXPECT_EQ(st.row != nullptr, rows[i].known) << st.keyword;
+        EXPECT_EQ(st.row != nullptr, rows[i].known) << st.keyword();
     }
     EXPECT_EQ(rc.first("DisplayName"), nullptr); // a skipped statement is not given
     EXPECT_EQ(m.stanzas[1].type, nullptr);
-    EXPECT_EQ(m.stanzas[1].statements.at(0).value, "\"abc\\\""); // unmatched quotes: kept as written
+    ASSERT_EQ(m.stanzas[1].statements.size(), 1u);
+    EXPECT_EQ(m.stanzas[1].statements[0].value(), "\"abc\\\""); // unmatched quotes: kept as written
     EXPECT_EQ(m.stanza_at(6), &rc);
     EXPECT_EQ(m.stanza_at(1), nullptr);
     EXPECT_EQ(m.last_line, 10);
@@ -49,7 +50,8 @@ TEST(SourceModel, ReadsStanzasAndStatementsAsTheCompilerDoes) {
 
 TEST(SourceModel, CountsLongLinesInPiecesOf254) {
     std::string tail = "ControlDefinition";
-    check::source_model m = check::read_model("#" + std::string(253, 'x') + tail + "\n" + tail + "\n");
+    std::string text = "#" + std::string(253, 'x') + tail + "\n" + tail + "\n";
+    check::source_model m = check::read_model(text);
     // The piece after the first 254 characters is a line of its own: a header.
     ASSERT_EQ(m.stanzas.size(), 2u);
     EXPECT_EQ(m.stanzas[0].line, 2);

@@ -42,6 +42,26 @@ std::string element(const std::string &type) {
 }
 const std::string USAGE = "ResourceVariableClass\n    VariableClass=Usage\n    ObservationInterval=1\n"
                           "    ReportingInterval=1\n";
+const std::string OTHER = "ResourceVariableClass\n    VariableClass=Other\n    ObservationInterval=1\n"
+                          "    ReportingInterval=1\n";
+// A second class, which a source may hold after the first.
+std::string second_class(const std::string &stanzas) {
+    return "ControlDefinition\n    FileVersion=1.0\nResourceClass\n    Description=1\n    DisplayName=2\n"
+           "    Properties=HasResources\n    ClassPermTemplate=t\n    ResourcePermTemplate=t\n    Name=Other.Class\n" +
+           stanzas;
+}
+// A further ResourceClass stanza of the same class.
+std::string more_class(const std::string &lines) {
+    return "ResourceClass\n    Description=1\n    DisplayName=2\n    Properties=HasResources\n"
+           "    ClassPermTemplate=t\n    ResourcePermTemplate=t\n" +
+           lines;
+}
+std::string sd_attribute(const std::string &element_lines) {
+    return pattr("s", 1, "SD") +
+           "PAttrSDDefinition # here\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
+           "    DataType=Int32\n" +
+           element_lines;
+}
 
 // Marks the line that holds `text` (its first occurrence) as the mistake.
 std::string here(std::string s, const std::string &text) { return s.insert(s.find('\n', s.find(text)), " # here"); }
@@ -78,6 +98,26 @@ const warning_case cases[] = {
      source(pattr("n", 1, "Int64", "    ValidValue=-5,5\n    DefaultValue=0\n"))},
     {"repeated-default", source(pattr("s", 1, "String", "    DefaultValue=a\n    DefaultValue=b # here\n")),
      source(pattr("s", 1, "StringArray", "    DefaultValue=a\n    DefaultValue=b\n"))},
+    // The Locator resolved is the class's last one.
+    {"locator",
+     source(pattr("Size", 1, "Int32") + more_class("    Locator=Sise # here\n"), "    Locator=Size\n    Name=T\n"),
+     source(pattr("Size", 1, "Int32") + more_class("    Locator=Size\n"), "    Locator=Bogus\n    Name=T\n")},
+    // A range with a NaN end holds no value.
+    {"default-range", source(pattr("n", 1, "Float64", "    ValidValue=nan,9\n    DefaultValue=1 # here\n")),
+     source(pattr("n", 1, "Float64", "    ValidValue=0,9\n    DefaultValue=1\n"))},
+    {"default-range", source(dattr("n", 1, "Float32", "    InitialValue=1 # here\n    Range=0,nan\n")),
+     source(dattr("n", 1, "Float32", "    InitialValue=1\n    Range=0,9\n"))},
+    // Each element of an attribute's structured value starts as 0.
+    {"default-range", source(sd_attribute("    ValidValue=1,9\n")), source(sd_attribute("    ValidValue=0,9\n"))},
+    {"binary-text", source(pattr("b", 1, "Binary", "    DefaultValue=5000c500a1b2c3d4 # here\n")),
+     source(pattr("b", 1, "Binary", "    DefaultValue=0x5000c500a1b2c3d4\n"))},
+    {"binary-text", source(dattr("b", 1, "BinaryArray", "    ValidStateValue=0x00,7fff # here\n")),
+     source(dattr("b", 1, "BinaryArray", "    ValidStateValue=0x00,text\n"))},
+    // A reader gives attribute 1 of the first class the ID that came from the second.
+    {"variable-class-shared",
+     source(here(dattr("u", 1, "Int32"), "DynamicResourceAttribute") + USAGE +
+            second_class(dattr("v", 1, "Int32", "    VariableClass=Usage\n"))),
+     source(dattr("u", 2, "Int32") + USAGE + second_class(dattr("v", 1, "Int32", "    VariableClass=Usage\n")))},
 };
 
 void PrintTo(const warning_case &c, std::ostream *os) { *os << c.name; }
@@ -104,6 +144,56 @@ TEST_P(Warning, FiresOnTheMistakeOnly) {
     EXPECT_NE(strict.err.find(": error: "), std::string::npos);
     check_run off = check_text(c.mistake, {"-W", std::string("no-") + c.name});
     EXPECT_EQ(off.err.find(std::string("[") + c.name + "]"), std::string::npos) << off.err;
+}
+
+TEST(Warning, ClaimsOnlyWhatIsStored) {
+    // An ignored letter leaves the action with no permission, not with the
+    // default of an action without Permission.
+    check_run r = check_text(source(action("a", 1, "    Permission=rw\n")));
+    EXPECT_NE(r.err.find("is stored with no permission letter at all [permission]"), std::string::npos) << r.err;
+    EXPECT_EQ(r.err.find("default"), std::string::npos) << r.err;
+
+    // Values that are not stored or never apply are not checked.
+    const std::string silent[] = {
+        source(pattr("n", 1, "UInt32", "    ValidValue=1,9\n    DefaultValue=10\n    DefaultValue=9\n")),
+        source(
+            pattr("n", 1, "UInt32", "    Properties=Public,ReqdForDefine\n    ValidValue=1,9\n    DefaultValue=10\n")),
+        source(pattr("n", 1, "UInt32", "    Properties=ReqdForDefine\n    ValidValue=1,9\n")),
+        source(attr("PersistentResourceAttribute", "s", 1, "SD", "    Properties=ReqdForDefine\n") +
+               "PAttrSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
+               "    DataType=Int32\n    ValidValue=1,9\n"),
+        source(element("Int32") + "    ValidValue=1,9\n"), // an operation's input has no stored value
+        source(pattr("b", 1, "Binary", "    DefaultValue=cafe\n    ValidValue=12345\n    ValidValue=0x1234\n")),
+        // Both classes' attribute 1 in one variable class, in the order a reader meets them.
+        source(dattr("u", 1, "Int32", "    VariableClass=Usage\n") + USAGE +
+               second_class(dattr("v", 1, "Int32", "    VariableClass=Usage\n"))),
+        // A class attribute's variable ID carries the class bit.
+        source(dattr("u", 1, "Int32") + USAGE +
+               second_class(attr("DynamicClassAttribute", "c", 1, "Int32", "    VariableClass=Usage\n",
+                                 "    VariableType=Quantity\n"))),
+    };
+    for (const std::string &text : silent) {
+        check_run quiet = check_text(text, {"-W", "no-repeated-default"});
+        EXPECT_EQ(quiet.status, 0) << text;
+        EXPECT_EQ(quiet.err, "") << text;
+    }
+}
+
+TEST(Warning, NamesTheVariableClassAReaderWouldChoose) {
+    // Usage comes first and holds v's ID 1, which u meets first; then v
+    // meets Other, which holds u's.
+    std::string text = source(dattr("u", 1, "Int32", "    VariableClass=Other\n") + USAGE + OTHER +
+                              second_class(dattr("v", 1, "Int32", "    VariableClass=Usage\n")));
+    check_run r = check_text(text);
+    auto line = [&](const std::string &marker, int skip = 0) { return std::to_string(line_of(text, marker) + skip); };
+    std::string expected =
+        "input.src:" + line("VariableClass=Other") +
+        ": warning: the variable ID 1 of 'u' (class 'Test.Class') is also that of 'v' (class 'Other.Class') in the "
+        "variable class 'Usage': the stored IDs cannot say which class they came from, and a reader of the CDB gives "
+        "'u' to 'Usage', not to 'Other' [variable-class-shared]\n"
+        "input.src:" +
+        line("    Name=v", -1) + ": note: the other DynamicResourceAttribute with variable ID 1\n";
+    EXPECT_EQ(r.err.substr(0, expected.size()), expected) << r.err;
 }
 
 INSTANTIATE_TEST_SUITE_P(Cases, Warning, ::testing::ValuesIn(cases),

@@ -2,6 +2,7 @@
 #include "check_source.h"
 
 #include <cstdlib>
+#include <new>
 
 #include "qecfg/qecfg.h"
 #include "warnings.h"
@@ -36,26 +37,30 @@ std::string default_output_name(const std::string &source) {
     return (dot == std::string::npos || dot == 0 ? base : base.substr(0, dot)) + ".cdef";
 }
 
-check_report check_text(const std::string &name, const std::string &text, const check_options &opt) {
+// The finding of the whole source when the check itself cannot go on.
+check_report trouble(std::string why) { return {2, {finding{severity::error, diagnostic{0, std::move(why)}, "", {}}}}; }
+
+check_report check_text(const std::string &name, const std::string &text, const check_options &opt) try {
     std::string output_name = opt.output_name.empty() ? default_output_name(name) : opt.output_name;
     qecfg::result r = compile(name, text, output_name);
+    if (r.status != 0 && r.status != 1)
+        return trouble(r.message.rfind(name + ": ", 0) == 0 ? r.message.substr(name.size() + 2) : r.message);
     check_report report;
-    report.status = r.status == 0 || r.status == 1 ? r.status : 2;
-    if (report.status == 2) {
-        std::string why = r.message.rfind(name + ": ", 0) == 0 ? r.message.substr(name.size() + 2) : r.message;
-        report.findings.push_back(finding{severity::error, diagnostic{0, why}, "", {}});
-        return report;
-    }
+    report.status = r.status;
     source_model m = read_model(text);
     if (r.status == 1) {
-        report.findings.push_back(finding{severity::error, explain_failure(r.message, m), "", {}});
+        explained e = explain_failure(r.message, m);
+        report.findings.push_back(finding{severity::error, std::move(e.where), "", std::move(e.notes)});
         return report;
     }
-    std::vector<bool> enabled = opt.enabled;
-    enabled.resize(warning_checks().size(), true);
-    for (warning_finding &f : run_warnings(m, warning_context{output_name}, enabled))
-        report.findings.push_back(finding{severity::warning, std::move(f.where), f.name, {}});
+    std::vector<bool> enabled = opt.enabled.empty() ? default_warnings() : opt.enabled;
+    enabled.resize(warning_checks().size(), false);
+    for (warning_finding &f : run_warnings(check_input{m, output_name}, enabled))
+        report.findings.push_back(
+            finding{severity::warning, std::move(f.found.where), f.name, std::move(f.found.notes)});
     return report;
+} catch (const std::bad_alloc &) {
+    return trouble(OUT_OF_MEMORY);
 }
 
 } // namespace check

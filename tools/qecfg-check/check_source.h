@@ -21,13 +21,16 @@ struct finding {
 
 struct check_options {
     std::string output_name;   // after which a class without Name is named
-    std::vector<bool> enabled; // by index of warning_checks(); empty: every warning
+    std::vector<bool> enabled; // by index of warning_checks(); empty: each in its default state
 };
 
 struct check_report {
     int status = 0;                // 0 compiles, 1 the compile fails, 2 memory ran out
     std::vector<finding> findings; // the error, or the warnings in source order
 };
+
+// The finding when memory runs out during a check (status 2).
+inline constexpr const char OUT_OF_MEMORY[] = "out of memory";
 
 // Compiles `text` in memory with qecfg's rules (messages naming the source
 // `name`) and explains its failure or runs the enabled warnings.

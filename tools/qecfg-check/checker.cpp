@@ -1,11 +1,14 @@
 // The checker's command line and the check of one source.
 #include "checker.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <new>
+#include <sys/stat.h>
 
-#include "qecfg/qecfg.h"
 #include "check_source.h"
+#include "qecfg/qecfg.h"
 #include "warnings.h"
 
 namespace check {
@@ -35,7 +38,7 @@ const char *HELP = "usage: qecfg-check [options] SOURCE...\n"
 enum status { CLEAN = 0, FINDING = 1, TROUBLE = 2 };
 
 struct settings {
-    std::vector<bool> enabled = std::vector<bool>(warning_checks().size(), true);
+    std::vector<bool> enabled = default_warnings();
     bool werror = false;
     bool list = false;
     std::string output_name;
@@ -113,10 +116,13 @@ bool parse_args(const std::vector<std::string> &args, settings &s, std::string &
 std::string list_warnings(const settings &s) {
     std::string text;
     const std::vector<warning_check> &checks = warning_checks();
+    size_t width = 0;
+    for (const warning_check &c : checks)
+        width = std::max(width, std::strlen(c.name) + 2);
     for (size_t i = 0; i < checks.size(); i++) {
         std::string name = checks[i].name;
-        text += name + std::string(name.size() < 18 ? 18 - name.size() : 1, ' ') + (s.enabled[i] ? "on   " : "off  ") +
-                checks[i].summary + "\n";
+        text += name + std::string(width - name.size(), ' ') + (s.enabled[i] ? "on   " : "off  ") + checks[i].summary +
+                "\n";
     }
     return text;
 }
@@ -125,10 +131,15 @@ std::string located(const std::string &file, const diagnostic &d) {
     return file + (d.line ? ":" + std::to_string(d.line) : "") + ": ";
 }
 
+// Reads a whole file; a regular file's size is reserved at once, so that
+// the text takes its size and no more.
 bool read_text(const std::string &path, std::string &text) {
     std::FILE *f = std::fopen(path.c_str(), "rb");
     if (!f)
         return false;
+    struct stat st {};
+    if (fstat(fileno(f), &st) == 0 && S_ISREG(st.st_mode))
+        text.reserve(size_t(st.st_size));
     char piece[65536];
     size_t n;
     while ((n = std::fread(piece, 1, sizeof piece, f)) > 0)
@@ -150,13 +161,20 @@ std::string unreadable(const std::string &path) {
     return r.message.rfind(path + ": ", 0) == 0 ? r.message.substr(path.size() + 2) : r.message;
 }
 
-status check_file(const std::string &path, const settings &s, writer &err) {
-    std::string text;
-    if (!read_text(path, text)) {
-        err.put(path + ": error: " + unreadable(path) + "\n");
-        return TROUBLE;
+// Reads and checks one source; exhausted memory is a finding like any other.
+check_report check_path(const std::string &path, const settings &s) {
+    try {
+        std::string text;
+        if (!read_text(path, text))
+            return {TROUBLE, {finding{severity::error, {0, unreadable(path)}, "", {}}}};
+        return check_text(path, text, check_options{s.output_name, s.enabled});
+    } catch (const std::bad_alloc &) {
+        return {TROUBLE, {finding{severity::error, {0, OUT_OF_MEMORY}, "", {}}}};
     }
-    check_report report = check_text(path, text, check_options{s.output_name, s.enabled});
+}
+
+status check_file(const std::string &path, const settings &s, writer &err) {
+    check_report report = check_path(path, s);
     for (const finding &f : report.findings) {
         bool error = f.level == severity::error || s.werror;
         err.put(located(path, f.where) + (error ? "error: " : "warning: ") + f.where.text +

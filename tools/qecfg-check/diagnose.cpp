@@ -20,7 +20,8 @@ bool ends_with(const std::string &s, const std::string &tail) {
     return s.size() >= tail.size() && s.compare(s.size() - tail.size(), tail.size(), tail) == 0;
 }
 
-std::string lower(std::string s) {
+std::string lower(std::string_view v) {
+    std::string s(v);
     for (char &c : s)
         c = char(std::tolower(static_cast<unsigned char>(c)));
     return s;
@@ -42,7 +43,7 @@ size_t edit_distance(const std::string &a, const std::string &b) {
     return row[b.size()];
 }
 
-std::string did_you_mean(const std::string &word, const std::vector<std::string> &candidates) {
+std::string did_you_mean(std::string_view word, const std::vector<std::string> &candidates) {
     std::string n = nearest(word, candidates);
     return n.empty() ? "" : "; did you mean '" + n + "'?";
 }
@@ -70,18 +71,9 @@ std::vector<std::string> missing_required(const stanza &s, int before, const std
 // structured-data element is completed without its ElementIndex.
 std::vector<std::string> completion_required(const stanza &s) {
     std::vector<std::string> v = row_names(*s.type, true);
-    if (s.type->structured_data)
-        v.erase(std::remove(v.begin(), v.end(), "ElementIndex"), v.end());
+    if (s.is_element())
+        v.erase(std::remove(v.begin(), v.end(), kw::ElementIndex), v.end());
     return v;
-}
-
-const statement *statement_at(const source_model &m, int line) {
-    const stanza *s = m.stanza_at(line);
-    if (s)
-        for (const statement &st : s->statements)
-            if (st.line == line)
-                return &st;
-    return nullptr;
 }
 
 // The records still open at a line: the pending structured-data element and
@@ -90,9 +82,9 @@ struct open_records {
     const stanza *element = nullptr;
     std::vector<const stanza *> last;
 
-    const stanza *of(const char *type_name) const {
+    const stanza *of(int kind) const {
         for (const stanza *s : last)
-            if (s->is(type_name))
+            if (s->is(kind))
                 return s;
         return nullptr;
     }
@@ -103,9 +95,9 @@ open_records open_at(const source_model &m, int line, bool inclusive) {
     for (const stanza &s : m.stanzas) {
         if (s.line > line || (s.line == line && !inclusive))
             break;
-        if (s.is("ControlDefinition"))
+        if (s.is(ST_CONTROL_DEFINITION))
             r.last.clear();
-        bool element = s.type && s.type->structured_data;
+        bool element = s.is_element();
         r.element = element ? &s : nullptr;
         if (!element) // an action ends at any other stanza
             r.last.erase(std::remove_if(r.last.begin(), r.last.end(), [](const stanza *k) { return k->is_action(); }),
@@ -120,8 +112,8 @@ open_records open_at(const source_model &m, int line, bool inclusive) {
     return r;
 }
 
-void add_kinds(std::vector<const stanza *> &order, const open_records &r, std::initializer_list<const char *> kinds) {
-    for (const char *k : kinds)
+void add_kinds(std::vector<const stanza *> &order, const open_records &r, std::initializer_list<int> kinds) {
+    for (int k : kinds)
         if (const stanza *s = r.of(k))
             order.push_back(s);
 }
@@ -136,14 +128,14 @@ std::vector<const stanza *> completed_at(const source_model &m, int line) {
         open_records r = open_at(m, line, false);
         if (r.element)
             order.push_back(r.element);
-        if (!header->type || !header->type->structured_data) {
-            add_kinds(order, r, {"ResourceAction", "ClassAction"});
-            if (header->is("ControlDefinition"))
+        if (!header->is_element()) {
+            add_kinds(order, r, {ST_RESOURCE_ACTION, ST_CLASS_ACTION});
+            if (header->is(ST_CONTROL_DEFINITION))
                 add_kinds(order, r,
-                          {"PersistentClassAttribute", "DynamicClassAttribute", "PersistentResourceAttribute",
-                           "DynamicResourceAttribute"});
+                          {ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE, ST_PERSISTENT_RESOURCE_ATTRIBUTE,
+                           ST_DYNAMIC_RESOURCE_ATTRIBUTE});
             else if (header->is_attribute())
-                add_kinds(order, r, {header->type->name.c_str()});
+                add_kinds(order, r, {header->kind});
         }
     }
     if (line == m.last_line) {
@@ -151,55 +143,56 @@ std::vector<const stanza *> completed_at(const source_model &m, int line) {
         if (r.element)
             order.push_back(r.element);
         add_kinds(order, r,
-                  {"PersistentResourceAttribute", "DynamicResourceAttribute", "PersistentClassAttribute",
-                   "DynamicClassAttribute", "ResourceAction", "ClassAction"});
+                  {ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE, ST_PERSISTENT_CLASS_ATTRIBUTE,
+                   ST_DYNAMIC_CLASS_ATTRIBUTE, ST_RESOURCE_ACTION, ST_CLASS_ACTION});
     }
     return order;
 }
 
-diagnostic incomplete_stanza(const diagnostic &d, const source_model &m) {
-    const stanza *header = m.stanza_at(d.line);
-    std::string when = header && header->line == d.line ? "the stanza header on line " + std::to_string(d.line)
-                                                        : "the end of the source";
+std::string stanza_name(int kind) { return stanza_names[kind]; }
+
+// The error stays on the compiler's line; the stanza that lacks statements
+// is a note.
+explained incomplete_stanza(const diagnostic &d, const source_model &m) {
     for (const stanza *s : completed_at(m, d.line)) {
         std::vector<std::string> missing = missing_required(*s, m.last_line + 1, completion_required(*s));
         if (!missing.empty())
-            return {s->line, d.text + ": the " + s->type->name + " stanza lacks " + listing(missing) + " (found at " +
-                                 when + ")"};
+            return {{d.line, d.text + ": the " + s->type->name + " stanza on " + on_line(s->line) + " lacks " +
+                                 listing(missing)},
+                    {{s->line, "the incomplete " + s->type->name + " stanza starts here"}}};
     }
-    return d;
+    return {d, {}};
 }
 
-diagnostic optional_too_early(const diagnostic &d, const source_model &m) {
+explained optional_too_early(const diagnostic &d, const source_model &m) {
     const stanza *s = m.stanza_at(d.line);
-    const statement *st = statement_at(m, d.line);
-    if (!s || !s->type || !st || !ends_with(d.text, st->keyword))
-        return d;
-    std::string text = d.text.substr(0, d.text.size() - st->keyword.size()) + ": '" + st->keyword + "' ";
+    const statement *st = m.statement_at(d.line);
+    if (!s || !s->type || !st || !ends_with(d.text, std::string(st->keyword())))
+        return {d, {}};
+    std::string text = d.text.substr(0, d.text.size() - st->keyword().size()) + ": " + quoted(st->keyword()) + " ";
     if (!s->type->optional_accepted)
-        return {d.line, text + "is refused: " + s->type->name + " accepts no optional statement"};
+        return {{d.line, text + "is refused: " + s->type->name + " accepts no optional statement"}, {}};
     std::vector<std::string> missing = missing_required(*s, d.line, row_names(*s->type, true));
-    return {d.line, text + "comes before the required " + listing(missing)};
+    return {{d.line, text + "comes before the required " + listing(missing)}, {}};
 }
 
 // The data type a value statement converts its value to.
 zu_data_type_t value_type(const stanza &s, const statement &st) {
-    if (st.keyword == "ElementIndex")
+    if (st.keyword() == kw::ElementIndex)
         return ZU_UINT32;
-    const statement *dt = s.first("DataType");
-    return dt ? lang::data_type_named(dt->value) : ZU_UNKNOWN;
+    return lang::data_type_named(s.value_of(kw::DataType));
 }
 
 std::string type_name(zu_data_type_t t) {
     return t == ZU_UNKNOWN ? "UNKNOWN" : lang::data_type_names().at(size_t(t) - 1);
 }
 
-diagnostic invalid_data(const diagnostic &d, const source_model &m) {
-    const statement *st = statement_at(m, d.line);
+explained invalid_data(const diagnostic &d, const source_model &m) {
+    const statement *st = m.statement_at(d.line);
     if (!st)
-        return d;
+        return {d, {}};
     zu_data_type_t type = value_type(*m.stanza_at(d.line), *st);
-    std::string bad = st->value;
+    std::string bad = st->text();
     size_t comma = bad.find(',');
     bool pair = st->row && comma != std::string::npos &&
                 (st->row->kind == lang::value_kind::valid_value || st->row->kind == lang::value_kind::range);
@@ -209,110 +202,145 @@ diagnostic invalid_data(const diagnostic &d, const source_model &m) {
     }
     std::string what =
         lang::is_array(type) ? "an element of type " + type_name(type) : "a value of type " + type_name(type);
-    return {d.line, d.text + ": '" + bad + "' (" + st->keyword + ") is not " + what};
+    return {{d.line, d.text + ": " + quoted(bad) + " (" + std::string(st->keyword()) + ") is not " + what}, {}};
 }
 
-diagnostic invalid_name(const diagnostic &d, const source_model &m, const std::vector<std::string> &names,
-                        const char *what) {
-    const statement *st = statement_at(m, d.line);
+explained invalid_name(const diagnostic &d, const source_model &m, const std::vector<std::string> &names,
+                       const char *what) {
+    const statement *st = m.statement_at(d.line);
     if (!st)
-        return d;
-    return {d.line, d.text + ": '" + st->value + "'" + did_you_mean(st->value, names) + " (" + what + ": " +
-                        listing(names) + ")"};
+        return {d, {}};
+    return {{d.line, d.text + ": " + quoted(st->value()) + did_you_mean(st->value(), names) + " (" + what + ": " +
+                         listing(names) + ")"},
+            {}};
 }
 
-diagnostic unknown_statement(const diagnostic &d, const source_model &m) {
-    const statement *st = statement_at(m, d.line);
+explained unknown_statement(const diagnostic &d, const source_model &m) {
+    const statement *st = m.statement_at(d.line);
     const stanza *s = m.stanza_at(d.line);
-    if (!st || !s || !s->type || !ends_with(d.text, st->keyword + s->type->name))
-        return d;
-    std::string prefix = d.text.substr(0, d.text.size() - st->keyword.size() - s->type->name.size());
-    return {d.line, prefix + "'" + st->keyword + "' is no statement of " + s->type->name +
-                        did_you_mean(st->keyword, row_names(*s->type, false))};
+    if (!st || !s || !s->type || !ends_with(d.text, std::string(st->keyword()) + s->type->name))
+        return {d, {}};
+    std::string prefix = d.text.substr(0, d.text.size() - st->keyword().size() - s->type->name.size());
+    return {{d.line, prefix + quoted(st->keyword()) + " is no statement of " + s->type->name +
+                         did_you_mean(st->keyword(), row_names(*s->type, false))},
+            {}};
 }
 
-diagnostic unknown_stanza(const diagnostic &d, const source_model &) {
+explained unknown_stanza(const diagnostic &d, const source_model &) {
     std::string header = d.text.substr(std::strlen("Invalid table name: "));
     if (!header.empty() && header.back() == '\r')
-        return {d.line, d.text + ": the line ends with a carriage return; save the source with plain newlines"};
-    std::vector<std::string> names;
-    for (const lang::stanza_type &t : lang::stanza_types())
-        names.push_back(t.name);
+        return {{d.line, d.text + ": the line ends with a carriage return; save the source with plain newlines"}, {}};
+    std::vector<std::string> names(std::begin(stanza_names), std::end(stanza_names));
     std::string hint = did_you_mean(header, names);
-    return {d.line, d.text + (hint.empty() ? ": no such stanza type (statements must be indented)" : hint)};
+    return {{d.line, d.text + (hint.empty() ? ": no such stanza type (statements must be indented)" : hint)}, {}};
 }
 
 bool has_class_before(const source_model &m, int line) {
     return std::any_of(m.stanzas.begin(), m.stanzas.end(),
-                       [&](const stanza &s) { return s.line < line && s.is("ControlDefinition"); });
+                       [&](const stanza &s) { return s.line < line && s.is(ST_CONTROL_DEFINITION); });
 }
 
-diagnostic no_class_yet(const diagnostic &d, const source_model &m) {
+explained no_class_yet(const diagnostic &d, const source_model &m) {
     if (has_class_before(m, d.line))
-        return d;
-    return {d.line, d.text + ": a ControlDefinition stanza must come first"};
+        return {d, {}};
+    return {{d.line, d.text + ": a " + stanza_name(ST_CONTROL_DEFINITION) + " stanza must come first"}, {}};
 }
 
-// The first stanza of a type, or its second when `second`.
-const stanza *stanza_of(const source_model &m, const char *type_name, bool second = false) {
+// The first stanza of a kind, or its second when `second`.
+const stanza *stanza_of(const source_model &m, int kind, bool second = false) {
     for (const stanza &s : m.stanzas)
-        if (s.is(type_name) && !std::exchange(second, false))
+        if (s.is(kind) && !std::exchange(second, false))
             return &s;
     return nullptr;
 }
 
-diagnostic second_mapping(const diagnostic &d, const source_model &m) {
-    const stanza *s = stanza_of(m, "ClassToManagerMapping", true);
-    return s ? diagnostic{s->line, d.text} : d;
+explained second_mapping(const diagnostic &d, const source_model &m) {
+    const stanza *s = stanza_of(m, ST_CLASS_TO_MANAGER_MAPPING, true);
+    return {s ? diagnostic{s->line, d.text} : d, {}};
 }
 
-diagnostic keys_reversed(const diagnostic &d, const source_model &m) {
-    const stanza *s = stanza_of(m, "ClassToManagerMapping");
-    const statement *first = s ? s->first("FirstKey") : nullptr, *last = s ? s->first("LastKey") : nullptr;
+// The error stays on the compiler's line, where the map is completed; the
+// FirstKey statement is a note.
+explained keys_reversed(const diagnostic &d, const source_model &m) {
+    const stanza *s = stanza_of(m, ST_CLASS_TO_MANAGER_MAPPING);
+    const statement *first = s ? s->first(kw::FirstKey) : nullptr, *last = s ? s->first(kw::LastKey) : nullptr;
     if (!first || !last)
-        return d;
-    return {first->line, d.text + " (FirstKey=" + first->value + ", LastKey=" + last->value + " on line " +
-                             std::to_string(last->line) + ")"};
+        return {d, {}};
+    std::string pair = std::string(kw::FirstKey) + "=" + first->text() + ", " + kw::LastKey + "=" + last->text();
+    return {{d.line, d.text + " (" + pair + " on " + on_line(last->line) + ")"},
+            {{first->line, std::string(kw::FirstKey) + " is given here"}}};
 }
 
-diagnostic no_manager(const diagnostic &d, const source_model &m) {
-    const stanza *s = stanza_of(m, "ClassToManagerMapping");
-    return s ? diagnostic{s->line, d.text + ": the ClassToManagerMapping stanza has no ResourceManager statement"} : d;
+explained no_manager(const diagnostic &d, const source_model &m) {
+    const stanza *s = stanza_of(m, ST_CLASS_TO_MANAGER_MAPPING);
+    if (!s)
+        return {d, {}};
+    return {{s->line, d.text + ": the " + stanza_name(ST_CLASS_TO_MANAGER_MAPPING) + " stanza has no " +
+                          kw::ResourceManager + " statement"},
+            {}};
 }
 
-diagnostic unnamed_class(const diagnostic &d, const source_model &m) {
+explained unnamed_class(const diagnostic &d, const source_model &m) {
     for (const stanza &s : m.stanzas)
-        if (s.is("ResourceClass") && !s.first("Name"))
-            return {s.line, d.text + ": this class has no Name statement and is named after the output file; give it "
-                                     "a Name (or an output name ending in .cdef, option -o)"};
-    return {d.line, d.text + ": a class without a Name statement is named after the output file (option -o)"};
+        if (s.is(ST_RESOURCE_CLASS) && !s.first(kw::Name))
+            return {{s.line, d.text + ": this class has no " + kw::Name +
+                                 " statement and is named after the output file; give it a " + kw::Name +
+                                 " (or an output name ending in .cdef, option -o)"},
+                    {}};
+    return {
+        {d.line, d.text + ": a class without a " + kw::Name + " statement is named after the output file (option -o)"},
+        {}};
 }
 
-diagnostic duplicate_statement(const diagnostic &d, const source_model &m) {
-    const statement *st = statement_at(m, d.line);
+explained duplicate_statement(const diagnostic &d, const source_model &m) {
+    const statement *st = m.statement_at(d.line);
     const stanza *s = m.stanza_at(d.line);
     if (!st || !s)
-        return d;
-    const statement *first = s->first(st->keyword);
-    return first && first != st
-               ? diagnostic{d.line, d.text + " (first given on line " + std::to_string(first->line) + ")"}
-               : d;
+        return {d, {}};
+    const statement *first = s->first(st->keyword());
+    return {first && first != st ? diagnostic{d.line, d.text + " (first given on " + on_line(first->line) + ")"} : d,
+            {}};
 }
 
-diagnostic index_out_of_sequence(const diagnostic &d, const source_model &m) {
+explained index_out_of_sequence(const diagnostic &d, const source_model &m) {
     const stanza *s = m.stanza_at(d.line);
     if (!s)
-        return d;
+        return {d, {}};
     int expected = 0;
     for (auto it = std::find_if(m.stanzas.rbegin(), m.stanzas.rend(), [&](const stanza &x) { return &x == s; }) + 1;
          it != m.stanzas.rend() && it->type == s->type; ++it)
         expected++;
-    return {d.line, d.text + ": the element " + std::to_string(expected) + " of this " + s->type->name +
-                        " definition needs ElementIndex=" + std::to_string(expected)};
+    return {{d.line, d.text + ": the element " + std::to_string(expected) + " of this " + s->type->name +
+                         " definition needs " + kw::ElementIndex + "=" + std::to_string(expected)},
+            {}};
+}
+
+// An attribute's structured value is built when its element run ends; an
+// element whose DataType names no data type cannot be built.
+explained attribute_element_type(const diagnostic &d, const source_model &m) {
+    const stanza *unknown = nullptr;
+    for (const stanza &s : m.stanzas) {
+        if (s.line > d.line)
+            break;
+        const statement *dt = s.first(kw::DataType);
+        bool attribute_element = s.is(ST_PATTR_SD) || s.is(ST_DATTR_SD);
+        if (attribute_element && dt && lang::data_type_named(dt->text()) == ZU_UNKNOWN && !unknown)
+            unknown = &s;
+        else if (!attribute_element && s.line < d.line)
+            unknown = nullptr; // the run ended before the error
+    }
+    if (!unknown)
+        return {d, {}};
+    const statement *dt = unknown->first(kw::DataType);
+    std::string hint = did_you_mean(dt->value(), lang::data_type_names());
+    return {{d.line, d.text + ": the element " + quoted(unknown->value_of(kw::ElementName)) + " of the " +
+                         unknown->type->name + " definition on " + on_line(unknown->line) + " has a " + kw::DataType +
+                         " that names no data type, so the attribute's structured value cannot be built"},
+            {{dt->line, std::string(kw::DataType) + "=" + dt->text() + " names no data type" + hint}}};
 }
 
 // The property statement that holds a word its stanza does not allow.
-diagnostic invalid_property(const diagnostic &d, const source_model &m) {
+explained invalid_property(const diagnostic &d, const source_model &m) {
     std::string word = d.text.substr(0, d.text.size() - INVALID_PROPERTY.size());
     for (const stanza &s : m.stanzas)
         for (const statement &st : s.statements) {
@@ -323,20 +351,21 @@ diagnostic invalid_property(const diagnostic &d, const source_model &m) {
                 allowed.push_back(st.row->props[i].s);
             if (std::find(allowed.begin(), allowed.end(), word) != allowed.end())
                 continue;
-            std::string list = st.value + ",";
+            std::string list = st.text() + ",";
             for (size_t a = 0, b; (b = list.find(',', a)) != std::string::npos; a = b + 1)
                 if (list.substr(a, b - a) == word)
-                    return {st.line, d.text + ": '" + word + "' is no property word of " + s.type->name +
-                                         did_you_mean(word, allowed) + " (the words: " + listing(allowed) + ")"};
+                    return {{st.line, d.text + ": " + quoted(word) + " is no property word of " + s.type->name +
+                                          did_you_mean(word, allowed) + " (the words: " + listing(allowed) + ")"},
+                            {}};
         }
-    return d;
+    return {d, {}};
 }
 
-diagnostic with_hint(const diagnostic &d, const char *hint) { return {d.line, d.text + ": " + hint}; }
+explained with_hint(const diagnostic &d, const std::string &hint) { return {{d.line, d.text + ": " + hint}, {}}; }
 
 struct explanation {
     const char *message; // the start of the compiler's message
-    std::function<diagnostic(const diagnostic &, const source_model &)> explain;
+    std::function<explained(const diagnostic &, const source_model &)> explain;
 };
 
 const explanation explanations[] = {
@@ -361,13 +390,14 @@ const explanation explanations[] = {
     {"Invalid cdef out file name (must end in .cdef)", unnamed_class},
     {"Already defined. Duplicated definitions not allowed for ", duplicate_statement},
     {"ElementIndeces must be consecutive", index_out_of_sequence},
+    {"dump_dflt: copy_this_sd_type default error", attribute_element_type},
     {"No classes defined",
      [](const diagnostic &d, const source_model &) {
-         return with_hint(d, "the source has no ControlDefinition stanza");
+         return with_hint(d, "the source has no " + stanza_name(ST_CONTROL_DEFINITION) + " stanza");
      }},
     {"No class-to-manager maps defined",
      [](const diagnostic &d, const source_model &) {
-         return with_hint(d, "the source needs a ClassToManagerMapping stanza");
+         return with_hint(d, "the source needs a " + stanza_name(ST_CLASS_TO_MANAGER_MAPPING) + " stanza");
      }},
 };
 
@@ -383,15 +413,19 @@ diagnostic split_message(const std::string &message) {
 
 } // namespace
 
-diagnostic explain_failure(const std::string &message, const source_model &m) {
+explained explain_failure(const std::string &message, const source_model &m) {
     diagnostic d = split_message(message);
     if (d.line == 0 && ends_with(d.text, INVALID_PROPERTY))
         return invalid_property(d, m);
     for (const explanation &e : explanations)
         if (d.text.rfind(e.message, 0) == 0)
             return e.explain(d, m);
-    return d;
+    return {d, {}};
 }
+
+std::string quoted(std::string_view s) { return "'" + std::string(s) + "'"; }
+
+std::string on_line(int line) { return "line " + std::to_string(line); }
 
 std::string listing(const std::vector<std::string> &names) {
     std::string s;
@@ -400,7 +434,7 @@ std::string listing(const std::vector<std::string> &names) {
     return s;
 }
 
-std::string nearest(const std::string &word, const std::vector<std::string> &candidates) {
+std::string nearest(std::string_view word, const std::vector<std::string> &candidates) {
     std::string best;
     size_t best_distance = std::max<size_t>(2, word.size() / 3) + 1;
     for (const std::string &c : candidates) {

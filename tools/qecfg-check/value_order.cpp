@@ -7,8 +7,6 @@
 
 namespace check {
 
-bool is_numeric(zu_data_type_t type) { return type >= ZU_INT32 && type <= ZU_FLOAT64; }
-
 number::number(zu_data_type_t type, const zu_value_t &v, std::string text) : text_(std::move(text)) {
     switch (type) {
     case ZU_INT32: kind_ = SIGNED, s_ = v.val_int32; break;
@@ -32,7 +30,7 @@ bool number::less(const number &o) const {
 
 std::optional<number> parse_number(zu_data_type_t type, const std::string &text) {
     zu_value_t v{};
-    if (!is_numeric(type) || !lang::value_converts(type, text, &v))
+    if (!zu_is_numeric_type(type) || !lang::value_converts(type, text, &v))
         return std::nullopt;
     return number(type, v, text);
 }

@@ -10,8 +10,6 @@
 
 namespace check {
 
-bool is_numeric(zu_data_type_t type);
-
 // A converted number of one of the numeric types.
 class number {
   public:
@@ -30,7 +28,9 @@ class number {
 
 struct value_range {
     number low, high;
-    bool holds(const number &n) const { return !n.less(low) && !high.less(n); }
+    // A range with a NaN end holds no value: every comparison with it fails.
+    bool has_nan_end() const { return low.unordered() || high.unordered(); }
+    bool holds(const number &n) const { return !has_nan_end() && !n.less(low) && !high.less(n); }
     bool reversed() const { return high.less(low); }
 };
 

@@ -1,344 +1,319 @@
-// The warnings, one function each, in the manner of a table of checks: every
-// check walks the source model and reports what compiles but is most likely
-// not what the author meant.
+// The table of warnings, and the checks of the parts of classes: what
+// compiles but is most likely not what the author meant.
 #include "warnings.h"
 
 #include <algorithm>
-#include <cctype>
-#include <cerrno>
 #include <cstdlib>
-#include <cstring>
 #include <map>
-#include <optional>
+#include <set>
 
-#include "value_order.h"
+#include "checks.h"
 
 namespace check {
 
+zu_data_type_t type_of(const stanza &s) { return lang::data_type_named(s.value_of(kw::DataType)); }
+
+std::uint32_t stored_identifier(const statement &st) {
+    return std::uint32_t(std::strtol(st.text().c_str(), nullptr, 0));
+}
+
 namespace {
 
-std::string quoted(const std::string &s) { return "'" + s + "'"; }
-std::string on_line(int line) { return "line " + std::to_string(line); }
-
-// The data type of an attribute or element stanza, and its name as given.
-std::string type_text(const stanza &s) {
-    const statement *dt = s.first("DataType");
-    return dt ? dt->value : "";
-}
-zu_data_type_t type_of(const stanza &s) { return lang::data_type_named(type_text(s)); }
-
-bool all_digits(const std::string &s) {
-    return !s.empty() &&
-           std::all_of(s.begin(), s.end(), [](char c) { return std::isdigit(static_cast<unsigned char>(c)); });
+std::string did_you_mean(std::string_view word, const std::vector<std::string> &candidates) {
+    std::string hint = nearest(word, candidates);
+    return hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)";
 }
 
-void locator(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const auto &cls : m.classes()) {
+// The name a class is stored under: its Name, or the output file's name.
+std::string class_name(const std::vector<const stanza *> &cls, const std::string &output_name) {
+    for (const stanza *s : cls)
+        if (const statement *n = s->is(ST_RESOURCE_CLASS) ? s->first(kw::Name) : nullptr)
+            return n->text();
+    return output_name.substr(0, output_name.find(".cdef"));
+}
+
+} // namespace
+
+// The last Locator of a class is the one resolved when the class is
+// completed, against all its persistent resource attributes.
+void locator(const check_input &in, std::vector<explained> &out) {
+    for (const auto &cls : in.model.classes()) {
         std::vector<std::string> names;
         std::map<std::string, std::string> other_kinds;
-        for (const stanza *s : cls)
-            if (const statement *n = s->first("Name"); n && s->is_attribute()) {
-                if (s->is("PersistentResourceAttribute"))
-                    names.push_back(n->value);
-                else
-                    other_kinds.emplace(n->value, s->type->name);
-            }
+        const statement *loc = nullptr;
         for (const stanza *s : cls) {
-            const statement *loc = s->is("ResourceClass") ? s->first("Locator") : nullptr;
-            if (!loc || std::find(names.begin(), names.end(), loc->value) != names.end())
-                continue;
-            std::string why = other_kinds.count(loc->value)
-                                  ? " is a " + other_kinds[loc->value] + ", not a PersistentResourceAttribute"
-                                  : " names no PersistentResourceAttribute of this class";
-            std::string hint = nearest(loc->value, names);
-            out.push_back({loc->line, "Locator " + quoted(loc->value) + why +
-                                          (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)") +
-                                          "; the class is stored without a locator"});
+            if (const statement *n = s->first(kw::Name); n && s->is_attribute()) {
+                if (s->is(ST_PERSISTENT_RESOURCE_ATTRIBUTE))
+                    names.push_back(n->text());
+                else
+                    other_kinds.emplace(n->text(), s->type->name);
+            }
+            if (const statement *l = s->is(ST_RESOURCE_CLASS) ? s->last(kw::Locator) : nullptr)
+                loc = l;
         }
+        if (!loc || std::find(names.begin(), names.end(), loc->value()) != names.end())
+            continue;
+        auto other = other_kinds.find(loc->text());
+        std::string why =
+            other != other_kinds.end()
+                ? " is a " + other->second + ", not a " + stanza_names[ST_PERSISTENT_RESOURCE_ATTRIBUTE]
+                : std::string(" names no ") + stanza_names[ST_PERSISTENT_RESOURCE_ATTRIBUTE] + " of this class";
+        out.push_back({{loc->line, std::string(kw::Locator) + " " + quoted(loc->value()) + why +
+                                       did_you_mean(loc->value(), names) + "; the class is stored without a locator"},
+                       {}});
     }
 }
 
+namespace {
+
 // Reports the second of two stanzas of one group with the same key.
-template <typename Key>
-void report_repeats(const std::vector<std::pair<Key, const statement *>> &keyed, const std::string &what,
-                    std::vector<diagnostic> &out) {
+template <typename Key> void report_repeats(const std::vector<std::pair<Key, const statement *>> &keyed,
+                                            const std::string &what, std::vector<explained> &out) {
     std::map<Key, const statement *> first;
     for (const auto &[key, st] : keyed)
         if (auto [it, fresh] = first.emplace(key, st); !fresh)
             out.push_back(
-                {st->line, what + " " + quoted(st->value) + " is already given on " + on_line(it->second->line)});
+                {{st->line, what + " " + quoted(st->value()) + " is already given on " + on_line(it->second->line)},
+                 {}});
 }
 
 // The groups of stanzas of a class whose members must differ: each attribute
 // and action kind by Id; resource attributes, class attributes and each action
 // kind by Name.
-const std::vector<std::vector<const char *>> id_groups = {
-    {"PersistentResourceAttribute"}, {"PersistentClassAttribute"}, {"DynamicResourceAttribute"},
-    {"DynamicClassAttribute"},       {"ResourceAction"},           {"ClassAction"}};
-const std::vector<std::vector<const char *>> name_groups = {{"PersistentResourceAttribute", "DynamicResourceAttribute"},
-                                                            {"PersistentClassAttribute", "DynamicClassAttribute"},
-                                                            {"ResourceAction"},
-                                                            {"ClassAction"}};
+const std::vector<std::vector<int>> id_groups = {{ST_PERSISTENT_RESOURCE_ATTRIBUTE},
+                                                 {ST_PERSISTENT_CLASS_ATTRIBUTE},
+                                                 {ST_DYNAMIC_RESOURCE_ATTRIBUTE},
+                                                 {ST_DYNAMIC_CLASS_ATTRIBUTE},
+                                                 {ST_RESOURCE_ACTION},
+                                                 {ST_CLASS_ACTION}};
+const std::vector<std::vector<int>> name_groups = {{ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE},
+                                                   {ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE},
+                                                   {ST_RESOURCE_ACTION},
+                                                   {ST_CLASS_ACTION}};
 
-bool in_group(const stanza &s, const std::vector<const char *> &group) {
-    return std::any_of(group.begin(), group.end(), [&](const char *t) { return s.is(t); });
+bool in_group(const stanza &s, const std::vector<int> &group) {
+    return std::find(group.begin(), group.end(), s.kind) != group.end();
 }
 
-void duplicate_id(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const auto &cls : m.classes())
+} // namespace
+
+void duplicate_id(const check_input &in, std::vector<explained> &out) {
+    for (const auto &cls : in.model.classes())
         for (const auto &group : id_groups) {
-            std::vector<std::pair<long, const statement *>> ids;
+            std::vector<std::pair<std::uint32_t, const statement *>> ids;
             for (const stanza *s : cls)
-                if (const statement *id = s->first("Id"); id && in_group(*s, group))
-                    ids.emplace_back(long(uint32_t(std::strtol(id->value.c_str(), nullptr, 0))), id);
-            report_repeats(ids, std::string(group[0]) + " Id", out);
+                if (const statement *id = s->first(kw::Id); id && in_group(*s, group))
+                    ids.emplace_back(stored_identifier(*id), id);
+            report_repeats(ids, std::string(stanza_names[group[0]]) + " " + kw::Id, out);
         }
 }
 
-void duplicate_name(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const auto &cls : m.classes())
+void duplicate_name(const check_input &in, std::vector<explained> &out) {
+    for (const auto &cls : in.model.classes())
         for (const auto &group : name_groups) {
             std::vector<std::pair<std::string, const statement *>> names;
             for (const stanza *s : cls)
-                if (const statement *n = s->first("Name"); n && in_group(*s, group))
-                    names.emplace_back(n->value, n);
+                if (const statement *n = s->first(kw::Name); n && in_group(*s, group))
+                    names.emplace_back(n->text(), n);
             report_repeats(names, "name", out);
         }
     // The elements of one structured-data definition: a run of one type.
     std::vector<std::pair<std::string, const statement *>> elements;
-    const lang::stanza_type *run = nullptr;
-    for (const stanza &s : m.stanzas) {
-        if (s.type != run) {
+    int run = NO_STANZA_TYPE;
+    for (const stanza &s : in.model.stanzas) {
+        if (s.kind != run) {
             report_repeats(elements, "element name", out);
             elements.clear();
         }
-        run = s.type && s.type->structured_data ? s.type : nullptr;
-        if (const statement *n = s.first("ElementName"); n && run)
-            elements.emplace_back(n->value, n);
+        run = s.is_element() ? s.kind : NO_STANZA_TYPE;
+        if (const statement *n = s.first(kw::ElementName); n && s.is_element())
+            elements.emplace_back(n->text(), n);
     }
     report_repeats(elements, "element name", out);
 }
 
-void variable_class(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    std::vector<std::string> defined;
+namespace {
+
+std::set<std::string, std::less<>> defined_variable_classes(const source_model &m) {
+    std::set<std::string, std::less<>> defined;
     for (const stanza &s : m.stanzas)
-        if (const statement *v = s.first("VariableClass"); v && s.is("ResourceVariableClass"))
-            defined.push_back(v->value);
-    for (const stanza &s : m.stanzas) {
-        const statement *v = s.is_dynamic() ? s.first("VariableClass") : nullptr;
-        if (!v || std::find(defined.begin(), defined.end(), v->value) != defined.end())
+        if (const statement *v = s.is(ST_RESOURCE_VARIABLE_CLASS) ? s.first(kw::VariableClass) : nullptr)
+            defined.insert(v->text());
+    return defined;
+}
+
+} // namespace
+
+void variable_class(const check_input &in, std::vector<explained> &out) {
+    std::set<std::string, std::less<>> defined = defined_variable_classes(in.model);
+    std::vector<std::string> names(defined.begin(), defined.end());
+    for (const stanza &s : in.model.stanzas) {
+        const statement *v = s.is_dynamic() ? s.first(kw::VariableClass) : nullptr;
+        if (!v || defined.count(v->value()))
             continue;
-        std::string hint = nearest(v->value, defined);
-        out.push_back({v->line, "VariableClass " + quoted(v->value) + " is defined by no ResourceVariableClass stanza" +
-                                    (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)")});
+        out.push_back(
+            {{v->line, std::string(kw::VariableClass) + " " + quoted(v->value()) + " is defined by no " +
+                           stanza_names[ST_RESOURCE_VARIABLE_CLASS] + " stanza" + did_you_mean(v->value(), names)},
+             {}});
     }
 }
 
-// The low,high ranges of a stanza's valid-value or range statements.
-std::vector<value_range> ranges_of(const stanza &s, const char *keyword, zu_data_type_t type) {
-    std::vector<value_range> v;
-    for (const statement *st : s.given(keyword))
-        if (std::optional<value_range> r = parse_range(type, st->value, !std::strcmp(keyword, "Range")))
-            v.push_back(*r);
+namespace {
+
+// A dynamic attribute as a variable class records it: by its variable ID,
+// which is its Id (with a bit for class attributes) and nothing of its class.
+struct variable_member {
+    const stanza *attribute;
+    size_t class_index;
+    std::uint32_t variable_id;
+    const statement *variable_class; // null when it names none that is defined
+};
+
+// The dynamic attributes in the order the compiler records their IDs: by
+// class, class attributes first.
+std::vector<variable_member> variable_members(const std::vector<std::vector<const stanza *>> &classes,
+                                              const std::set<std::string, std::less<>> &defined) {
+    std::vector<variable_member> v;
+    for (size_t k = 0; k < classes.size(); k++)
+        for (int kind : {ST_DYNAMIC_CLASS_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE})
+            for (const stanza *s : classes[k])
+                if (const statement *id = s->is(kind) ? s->first(kw::Id) : nullptr) {
+                    const statement *vc = s->first(kw::VariableClass);
+                    v.push_back(
+                        {s, k, stored_identifier(*id) | (kind == ST_DYNAMIC_CLASS_ATTRIBUTE ? CDB_CLASS_VAR_ID_BIT : 0),
+                         vc && defined.count(vc->value()) ? vc : nullptr});
+                }
     return v;
 }
 
-// The values an attribute starts with: its DefaultValue or InitialValue
-// statements, or the 0 that completion fills in.
-std::vector<std::pair<number, int>> start_values(const stanza &s, const char *keyword, zu_data_type_t type) {
-    std::vector<std::pair<number, int>> v;
-    for (const statement *st : s.given(keyword))
-        if (std::optional<number> n = parse_number(type, st->value))
-            v.emplace_back(*n, st->line);
-    if (v.empty() && s.given(keyword).empty())
-        v.emplace_back(*parse_number(type, "0"), 0);
-    return v;
-}
+// A variable class as a CDB keeps it: its name and the members whose IDs
+// it holds, in order, and how many of them a reader has matched.
+struct variable_ids {
+    std::string name;
+    std::vector<const variable_member *> members;
+    size_t next = 0;
+};
 
-void check_start_values(const stanza &s, const char *keyword, const char *limits,
-                        const std::vector<value_range> &ranges, zu_data_type_t type, std::vector<diagnostic> &out) {
-    if (ranges.empty())
-        return;
-    for (const auto &[n, line] : start_values(s, keyword, type)) {
-        if (n.unordered() ||
-            std::any_of(ranges.begin(), ranges.end(), [&](const value_range &r) { return r.holds(n); }))
+} // namespace
+
+// A CDB keeps per variable class only the variable IDs of its dynamic
+// attributes. A reader gives each attribute, walking them in the compiler's
+// order, the first variable class whose next ID is its own; where an ID
+// that came from another class matches first, the reader's choice is not
+// what the source wrote.
+void variable_class_shared(const check_input &in, std::vector<explained> &out) {
+    std::vector<std::vector<const stanza *>> classes = in.model.classes();
+    std::vector<variable_ids> tables;
+    for (const stanza &s : in.model.stanzas)
+        if (const statement *v = s.is(ST_RESOURCE_VARIABLE_CLASS) ? s.first(kw::VariableClass) : nullptr)
+            tables.push_back({v->text(), {}});
+    std::set<std::string, std::less<>> defined = defined_variable_classes(in.model);
+    std::vector<variable_member> members = variable_members(classes, defined);
+    for (const variable_member &m : members)
+        if (m.variable_class) // the first variable class of the name gets the ID
+            std::find_if(tables.begin(), tables.end(), [&](const variable_ids &t) {
+                return t.name == m.variable_class->value();
+            })->members.push_back(&m);
+    for (const variable_member &m : members) {
+        auto taken = std::find_if(tables.begin(), tables.end(), [&](const variable_ids &t) {
+            return t.next < t.members.size() && t.members[t.next]->variable_id == m.variable_id;
+        });
+        if (taken == tables.end())
             continue;
-        std::string what =
-            line ? keyword + std::string(" ") + n.text() : "the default " + n.text() + " (no " + keyword + ")";
-        out.push_back({line ? line : s.line, what + " lies outside the " + limits + " of " + s.type->name + " " +
-                                                 quoted(s.first("Name") ? s.first("Name")->value : "")});
+        const variable_member &owner = *taken->members[taken->next++];
+        if (&owner == &m)
+            continue;
+        std::string written = m.variable_class ? "to " + quoted(m.variable_class->value()) : "to no variable class";
+        std::string name = quoted(m.attribute->value_of(kw::Name));
+        out.push_back({{m.variable_class ? m.variable_class->line : m.attribute->line,
+                        "the variable ID " + std::to_string(m.variable_id) + " of " + name + " (class " +
+                            quoted(class_name(classes[m.class_index], in.output_name)) + ") is also that of " +
+                            quoted(owner.attribute->value_of(kw::Name)) + " (class " +
+                            quoted(class_name(classes[owner.class_index], in.output_name)) +
+                            ") in the variable class " + quoted(taken->name) +
+                            ": the stored IDs cannot say which class they came from, and a reader of "
+                            "the CDB gives " +
+                            name + " to " + quoted(taken->name) + ", not " + written},
+                       {{owner.attribute->line, "the other " + owner.attribute->type->name + " with variable ID " +
+                                                    std::to_string(m.variable_id)}}});
     }
 }
 
-void default_range(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas) {
-        zu_data_type_t type = lang::element_type_of(type_of(s));
-        if (!s.is_attribute() || !is_numeric(type))
-            continue;
-        if (!s.is_dynamic()) {
-            check_start_values(s, "DefaultValue", "ValidValue ranges", ranges_of(s, "ValidValue", type), type, out);
-            continue;
-        }
-        check_start_values(s, "InitialValue", "ValidStateValue ranges", ranges_of(s, "ValidStateValue", type), type,
-                           out);
-        check_start_values(s, "InitialValue", "Range", ranges_of(s, "Range", type), type, out);
-    }
-}
-
-bool plain_number(const std::string &text, long long lo, long long hi) {
-    char *end = nullptr;
-    errno = 0;
-    long long v = std::strtoll(text.c_str(), &end, 0);
-    return end != text.c_str() && *end == '\0' && errno == 0 && v >= lo && v <= hi;
-}
-
-void file_version(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas)
-        for (const statement *v : s.given("FileVersion")) {
-            std::string parts = v->value + ".";
-            size_t count = 0;
-            bool plain = true;
-            for (size_t a = 0, b; (b = parts.find('.', a)) != std::string::npos; a = b + 1, count++) {
-                std::string part = parts.substr(a, b - a);
-                plain = plain && all_digits(part) && part.size() <= 3 && std::stoi(part) <= 255;
-            }
-            if (!plain || count > 4)
-                out.push_back({v->line, "FileVersion " + quoted(v->value) +
-                                            " is not up to four dot-separated numbers of 0 to 255; it is stored as " +
-                                            version_text(v->value)});
-        }
-}
-
-void unnamed_class(const source_model &m, const warning_context &ctx, std::vector<diagnostic> &out) {
-    std::string name = ctx.output_name.substr(0, ctx.output_name.find(".cdef"));
-    for (const auto &cls : m.classes())
+void unnamed_class(const check_input &in, std::vector<explained> &out) {
+    std::string name = in.output_name.substr(0, in.output_name.find(".cdef"));
+    for (const auto &cls : in.model.classes())
         if (std::none_of(cls.begin(), cls.end(),
-                         [](const stanza *s) { return s->is("ResourceClass") && s->first("Name"); }))
-            out.push_back({cls.front()->line, "the class has no Name statement and is named after the output file (" +
-                                                  quoted(name) + " for output " + quoted(ctx.output_name) + ")"});
+                         [](const stanza *s) { return s->is(ST_RESOURCE_CLASS) && s->first(kw::Name); }))
+            out.push_back({{cls.front()->line, std::string("the class has no ") + kw::Name +
+                                                   " statement and is named after the output file (" + quoted(name) +
+                                                   " for output " + quoted(in.output_name) + ")"},
+                           {}});
 }
 
-// Numbers of statements, read like strtol with base 0 and truncated.
-void number_text(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas)
-        for (const statement &st : s.statements) {
-            if (!st.row || st.skipped)
-                continue;
-            bool fits = true;
-            switch (st.row->kind) {
-            case lang::value_kind::integer:
-            case lang::value_kind::display_name: fits = plain_number(st.value, 0, 65535); break;
-            case lang::value_kind::identifier: fits = plain_number(st.value, INT32_MIN, UINT32_MAX); break;
-            case lang::value_kind::variety: {
-                size_t comma = st.value.find(',');
-                fits = comma == std::string::npos || (plain_number(st.value.substr(0, comma), INT32_MIN, UINT32_MAX) &&
-                                                      plain_number(st.value.substr(comma + 1), INT32_MIN, UINT32_MAX));
-                break;
-            }
-            default: continue;
-            }
-            if (!fits)
-                out.push_back({st.line, st.keyword + "=" + st.value +
-                                            " is not a number that fits its field; it is stored as " +
-                                            stored_number(st.row->kind, st.value)});
-        }
-}
+namespace {
 
-void permission(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    std::string letters = lang::permission_letters();
-    for (const stanza &s : m.stanzas)
-        for (const statement *p : s.given("Permission")) {
-            if (p->value.size() == 1 && letters.find(p->value[0]) != std::string::npos)
-                continue;
-            bool known = letters.find(p->value[0]) != std::string::npos;
-            out.push_back({p->line, "Permission " + quoted(p->value) +
-                                        (known ? ": only the first letter counts"
-                                               : ": the first letter is no permission letter (" + letters +
-                                                     ") and is ignored; the action gets the default 's'")});
-        }
-}
-
-void element_type(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas) {
-        const statement *dt = s.type && s.type->structured_data ? s.first("DataType") : nullptr;
-        if (dt && lang::data_type_named(dt->value) == ZU_UNKNOWN) {
-            std::string hint = nearest(dt->value, lang::data_type_names());
-            out.push_back({dt->line, "DataType " + quoted(dt->value) +
-                                         " names no data type; the element is stored with the type UNKNOWN" +
-                                         (hint.empty() ? "" : " (did you mean " + quoted(hint) + "?)")});
-        }
-    }
-}
-
-void ignored_range(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas) {
-        const statement *r = s.is_dynamic() ? s.first("Range") : nullptr;
-        zu_data_type_t t = lang::element_type_of(type_of(s));
-        if (r && !is_numeric(t) && t != ZU_NONE)
-            out.push_back({r->line, "Range is ignored for the data type " + type_text(s)});
-    }
-}
-
-void reversed_range(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas)
-        for (const statement &st : s.statements) {
-            if (!st.row || st.skipped)
-                continue;
-            std::optional<value_range> r;
-            if (st.row->kind == lang::value_kind::variety)
-                r = parse_range(ZU_INT64, st.value, true);
-            else if (st.row->kind == lang::value_kind::valid_value || st.row->kind == lang::value_kind::range)
-                r = parse_range(lang::element_type_of(type_of(s)), st.value, true);
-            if (r && r->reversed())
-                out.push_back({st.line, st.keyword + "=" + st.value + " has its low end above its high end"});
-        }
-}
-
-void repeated_default(const source_model &m, const warning_context &, std::vector<diagnostic> &out) {
-    for (const stanza &s : m.stanzas) {
-        std::vector<const statement *> d = s.given("DefaultValue");
-        if (s.is_attribute() && d.size() > 1 && !lang::is_array(type_of(s)))
-            out.push_back({d[1]->line, "a second DefaultValue for the scalar type " + type_text(s) +
-                                           ": only the last one (line " + std::to_string(d.back()->line) +
-                                           ") is kept"});
-    }
+std::string words(std::initializer_list<std::string_view> parts) {
+    std::string s;
+    for (std::string_view p : parts)
+        s += p;
+    return s;
 }
 
 } // namespace
 
 const std::vector<warning_check> &warning_checks() {
+    const char *pra = stanza_names[ST_PERSISTENT_RESOURCE_ATTRIBUTE];
     static const std::vector<warning_check> checks = {
-        {"locator", "a Locator that names no PersistentResourceAttribute of its class", locator},
-        {"duplicate-id", "two attributes or actions of one kind in a class with the same Id", duplicate_id},
-        {"duplicate-name", "two attributes, actions or elements of one definition with the same name", duplicate_name},
-        {"variable-class", "a VariableClass that no ResourceVariableClass defines", variable_class},
-        {"default-range", "a default or initial value outside the valid values or the range", default_range},
-        {"file-version", "a FileVersion that is not up to four numbers of 0 to 255", file_version},
-        {"unnamed-class", "a class without Name, named after the output file", unnamed_class},
-        {"number-text", "a number statement that is no plain number or does not fit its field", number_text},
-        {"permission", "a Permission whose letter is ignored", permission},
-        {"element-type", "a structured-data element DataType that names no data type", element_type},
-        {"ignored-range", "a Range for a data type that has none", ignored_range},
-        {"reversed-range", "a low,high pair whose low end is above its high end", reversed_range},
-        {"repeated-default", "several DefaultValue statements for a scalar type", repeated_default},
+        {"locator", true, words({"a ", kw::Locator, " that names no ", pra, " of its class"}), locator},
+        {"duplicate-id", true, words({"two attributes or actions of one kind in a class with the same ", kw::Id}),
+         duplicate_id},
+        {"duplicate-name", true, "two attributes, actions or elements of one definition with the same name",
+         duplicate_name},
+        {"variable-class", true,
+         words({"a ", kw::VariableClass, " that no ", stanza_names[ST_RESOURCE_VARIABLE_CLASS], " defines"}),
+         variable_class},
+        {"variable-class-shared", true,
+         "dynamic attributes of several classes whose variable IDs a reader assigns to another variable class",
+         variable_class_shared},
+        {"default-range", true, "a stored default or initial value outside the valid values or the range",
+         default_range},
+        {"file-version", true, words({"a ", kw::FileVersion, " that is not up to four numbers of 0 to 255"}),
+         file_version},
+        {"unnamed-class", true, words({"a class without ", kw::Name, ", named after the output file"}), unnamed_class},
+        {"number-text", true, "a number statement that is no plain number or does not fit its field", number_text},
+        {"permission", true, words({"a ", kw::Permission, " whose letter is ignored"}), permission},
+        {"element-type", true, words({"a structured-data element ", kw::DataType, " that names no data type"}),
+         element_type},
+        {"ignored-range", true, words({"a ", kw::Range, " for a data type that has none"}), ignored_range},
+        {"reversed-range", true, "a low,high pair whose low end is above its high end", reversed_range},
+        {"repeated-default", true, words({"several ", kw::DefaultValue, " statements for a scalar type"}),
+         repeated_default},
+        {"binary-text", true, "a Binary value of hex digits without 0x, stored as their characters", binary_text},
     };
     return checks;
 }
 
-std::vector<warning_finding> run_warnings(const source_model &m, const warning_context &ctx,
-                                          const std::vector<bool> &enabled) {
+std::vector<bool> default_warnings() {
+    std::vector<bool> v;
+    for (const warning_check &c : warning_checks())
+        v.push_back(c.on_by_default);
+    return v;
+}
+
+std::vector<warning_finding> run_warnings(const check_input &in, const std::vector<bool> &enabled) {
     std::vector<warning_finding> found;
     const std::vector<warning_check> &checks = warning_checks();
     for (size_t i = 0; i < checks.size(); i++) {
         if (!enabled[i])
             continue;
-        std::vector<diagnostic> out;
-        checks[i].run(m, ctx, out);
-        for (const diagnostic &d : out)
-            found.push_back({d, checks[i].name});
+        std::vector<explained> out;
+        checks[i].run(in, out);
+        for (explained &e : out)
+            found.push_back({std::move(e), checks[i].name});
     }
-    std::stable_sort(found.begin(), found.end(),
-                     [](const warning_finding &a, const warning_finding &b) { return a.where.line < b.where.line; });
+    std::stable_sort(found.begin(), found.end(), [](const warning_finding &a, const warning_finding &b) {
+        return a.found.where.line < b.found.where.line;
+    });
     return found;
 }
 

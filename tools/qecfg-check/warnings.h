@@ -1,5 +1,6 @@
-// The checker's warnings: likely mistakes in a source that compiles. Each has
-// a name by which it is switched on and off.
+// The checker's warnings: likely mistakes in a source that compiles, as a
+// table of checks. Each row has the name by which it is switched on and off,
+// its state when no option names it, a summary and the function that runs it.
 #ifndef QECFG_CHECK_WARNINGS_H
 #define QECFG_CHECK_WARNINGS_H
 
@@ -11,26 +12,34 @@
 
 namespace check {
 
-struct warning_context {
+// What a check sees: the source and what the compile was given.
+struct check_input {
+    const source_model &model;
     std::string output_name; // what an unnamed class is named after
 };
 
-struct warning_finding {
-    diagnostic where;
-    const char *name;
-};
+using check_function = void (*)(const check_input &, std::vector<explained> &);
 
 struct warning_check {
     const char *name;
-    const char *summary;
-    void (*run)(const source_model &, const warning_context &, std::vector<diagnostic> &);
+    bool on_by_default;
+    std::string summary;
+    check_function run;
 };
 
 const std::vector<warning_check> &warning_checks();
 
+// The state of each warning by index of warning_checks() when no option
+// names it.
+std::vector<bool> default_warnings();
+
+struct warning_finding {
+    explained found;
+    const char *name;
+};
+
 // The findings of the enabled checks, in source order.
-std::vector<warning_finding> run_warnings(const source_model &m, const warning_context &ctx,
-                                          const std::vector<bool> &enabled);
+std::vector<warning_finding> run_warnings(const check_input &in, const std::vector<bool> &enabled);
 
 } // namespace check
 
