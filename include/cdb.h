@@ -1,3 +1,25 @@
+// Glossary of the format's names (the stored files and these headers keep
+// them; each is explained here rather than renamed):
+//   cdb      class definition database: the one file qecfg writes from a
+//            source, mapped by the resource service on machines of either byte order.
+//   dsect    one section of a CDB that a header anchor (cdb_dsect_anchor_t)
+//            locates: a class, the class-to-manager map, a manager or a variable class.
+//   zu, qel  see zu.h (data types and values) and qel.h (identifiers of the
+//            resource service); kb_ names the compiler's tables of data-type classes.
+//   variety  a number range (VarietyRange=low,high) that an attribute or action
+//            applies to; kept as a variety list (variety_list_t, vl_ fields).
+//   valid-value set  the values or low,high ranges an attribute or element
+//            allows (ValidValue, ValidStateValue); kept as valid_values_t, vv_ fields.
+//   locator  the persistent resource attribute that locates a resource of a
+//            class (Locator); rc_locator holds its Id, CDB_NO_LOCATOR for none.
+//   variable class  a named group of dynamic attributes observed and reported
+//            at common intervals; it keeps only their variable IDs (Id, class bit).
+//   record prefixes  rc_ resource class, ra_ resource attribute, ac_ action,
+//            re_ error, rd_ dependency, rcm_ class-to-manager map, rm_ manager,
+//            rvc_ variable class, sd_ structured data, sb_ SBS, vl_ variety list,
+//            vv_ valid values, cda_ dsect anchor, cdb_hdr_ header; u_ a reference
+//            (cdb_ref_t) to a table or string; cb_ID the record's identifier word.
+//
 // The class definition database (CDB): header, dsect anchors and the records
 // shared by the compiler's memory and the file. Every size and offset here is
 // part of the file format.

@@ -1,3 +1,7 @@
+// Glossary: qel_ names the identifiers and types of the resource service that
+//   maps a CDB (attribute, action, class and manager ids, its timestamp).
+//   The other names of the format are explained at the top of cdb.h.
+//
 // Identifier types of the resource service that CDB records carry.
 #ifndef QEL_H
 #define QEL_H

@@ -1,3 +1,7 @@
+// Glossary: zu_ names the data-type and value model (zu_data_type_t, the
+//   typed value zu_value_t) that sources, records and readers share. The
+//   other names of the format are explained at the top of cdb.h.
+//
 // Common data types and the typed value model shared by the compiler, the
 // CDB records and every reader of a CDB.
 #ifndef ZU_H

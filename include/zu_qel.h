@@ -1,3 +1,6 @@
+// Glossary: zu_qel names what the data-type model (zu) shares with the
+//   resource service (qel). The other names are explained at the top of cdb.h.
+//
 // Types that the data type model shares with the resource service: the
 // variable type of a dynamic attribute.
 #ifndef ZU_QEL_H
