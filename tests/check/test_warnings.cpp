@@ -111,7 +111,7 @@ const warning_case cases[] = {
     {"default-range", source(sd_attribute("    ValidValue=1,9\n")), source(sd_attribute("    ValidValue=0,9\n"))},
     {"binary-text", source(pattr("b", 1, "Binary", "    DefaultValue=5000c500a1b2c3d4 # here\n")),
      source(pattr("b", 1, "Binary", "    DefaultValue=0x5000c500a1b2c3d4\n"))},
-    {"binary-text", source(dattr("b", 1, "BinaryArray", "    ValidStateValue=0x00,7fff # here\n")),
+    {"binary-text", source(dattr("b", 1, "BinaryArray", "    ValidStateValue=0x00,7fff0000 # here\n")),
      source(dattr("b", 1, "BinaryArray", "    ValidStateValue=0x00,text\n"))},
     // A reader gives attribute 1 of the first class the ID that came from the second.
     {"variable-class-shared",
@@ -163,7 +163,9 @@ TEST(Warning, ClaimsOnlyWhatIsStored) {
                "PAttrSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"
                "    DataType=Int32\n    ValidValue=1,9\n"),
         source(element("Int32") + "    ValidValue=1,9\n"), // an operation's input has no stored value
-        source(pattr("b", 1, "Binary", "    DefaultValue=cafe\n    ValidValue=12345\n    ValidValue=0x1234\n")),
+        source(
+            pattr("b", 1, "Binary",
+                  "    DefaultValue=cafebabe\n    ValidValue=1234567\n    ValidValue=2024\n    ValidValue=0x1234\n")),
         // Both classes' attribute 1 in one variable class, in the order a reader meets them.
         source(dattr("u", 1, "Int32", "    VariableClass=Usage\n") + USAGE +
                second_class(dattr("v", 1, "Int32", "    VariableClass=Usage\n"))),

@@ -223,7 +223,8 @@ void variable_class_shared(const check_input &in, std::vector<explained> &out) {
         const variable_member &owner = *taken->members[taken->next++];
         if (&owner == &m)
             continue;
-        std::string written = m.variable_class ? "to " + quoted(m.variable_class->value()) : "to no variable class";
+        std::string written = m.variable_class ? ", not to " + quoted(m.variable_class->value())
+                                               : ", although it names no variable class";
         std::string name = quoted(m.attribute->value_of(kw::Name));
         out.push_back({{m.variable_class ? m.variable_class->line : m.attribute->line,
                         "the variable ID " + std::to_string(m.variable_id) + " of " + name + " (class " +
@@ -233,7 +234,7 @@ void variable_class_shared(const check_input &in, std::vector<explained> &out) {
                             ") in the variable class " + quoted(taken->name) +
                             ": the stored IDs cannot say which class they came from, and a reader of "
                             "the CDB gives " +
-                            name + " to " + quoted(taken->name) + ", not " + written},
+                            name + " to " + quoted(taken->name) + written},
                        {{owner.attribute->line, "the other " + owner.attribute->type->name + " with variable ID " +
                                                     std::to_string(m.variable_id)}}});
     }

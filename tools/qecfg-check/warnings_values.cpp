@@ -243,10 +243,10 @@ void repeated_default(const check_input &in, std::vector<explained> &out) {
 namespace {
 
 // Text the compiler stores as its characters that reads like hexadecimal
-// bytes: an even number of at least four hex digits, one of them a decimal
+// bytes: an even number of at least eight hex digits, one of them a decimal
 // digit, not starting with 0 (a value starting with 0 must be 0x...).
 bool looks_hexadecimal(std::string_view v) {
-    return v.size() >= 4 && v.size() % 2 == 0 && v[0] != '0' && all_of_class(v, isxdigit) &&
+    return v.size() >= 8 && v.size() % 2 == 0 && v[0] != '0' && all_of_class(v, isxdigit) &&
            std::any_of(v.begin(), v.end(), [](char c) { return std::isdigit(static_cast<unsigned char>(c)); });
 }
 
