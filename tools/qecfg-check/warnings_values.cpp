@@ -46,19 +46,24 @@ std::vector<std::pair<number, int>> stored_values(const stanza &s, const char *k
     return v;
 }
 
-void check_stored_values(const stanza &s, const char *keyword, const char *limits,
-                         const std::vector<value_range> &ranges, std::vector<explained> &out) {
+// Checks the stored values of `keyword` against the ranges of the
+// `limits` statements.
+void check_stored_values(const stanza &s, const char *keyword, const char *limits, std::vector<explained> &out) {
+    zu_data_type_t type = lang::element_type_of(type_of(s));
+    std::vector<value_range> ranges = ranges_of(s, limits, type);
     if (ranges.empty())
         return;
+    std::string limit_name = limits + std::string(std::string_view(limits) == kw::Range ? "" : " ranges");
     bool nan_end = std::any_of(ranges.begin(), ranges.end(), [](const value_range &r) { return r.has_nan_end(); });
     for (const auto &[n, line] : stored_values(s, keyword)) {
         if (n.unordered() ||
             std::any_of(ranges.begin(), ranges.end(), [&n = n](const value_range &r) { return r.holds(n); }))
             continue;
-        std::string what =
-            line ? keyword + std::string(" ") + n.text() : "the default " + n.text() + " (no " + keyword + ")";
+        std::string what = line             ? keyword + std::string(" ") + n.text()
+                           : s.is_element() ? "the value " + n.text() + " that the element starts with"
+                                            : "the default " + n.text() + " (no " + keyword + ")";
         std::string owner = s.is_element() ? kw::ElementName : kw::Name;
-        out.push_back({{line ? line : s.line, what + " lies outside the " + limits + " of " + s.type->name + " " +
+        out.push_back({{line ? line : s.line, what + " lies outside the " + limit_name + " of " + s.type->name + " " +
                                                   quoted(s.value_of(owner)) +
                                                   (nan_end ? " (a range with a NaN end holds no value)" : "")},
                        {}});
@@ -84,14 +89,13 @@ bool default_applies(const stanza &attribute) {
 }
 
 void check_attribute(const stanza &s, std::vector<explained> &out) {
-    zu_data_type_t type = lang::element_type_of(type_of(s));
     if (s.is_persistent()) {
         if (default_applies(s))
-            check_stored_values(s, kw::DefaultValue, "ValidValue ranges", ranges_of(s, kw::ValidValue, type), out);
+            check_stored_values(s, kw::DefaultValue, kw::ValidValue, out);
         return;
     }
-    check_stored_values(s, kw::InitialValue, "ValidStateValue ranges", ranges_of(s, kw::ValidStateValue, type), out);
-    check_stored_values(s, kw::InitialValue, "Range", ranges_of(s, kw::Range, type), out);
+    check_stored_values(s, kw::InitialValue, kw::ValidStateValue, out);
+    check_stored_values(s, kw::InitialValue, kw::Range, out);
 }
 
 } // namespace
@@ -111,8 +115,7 @@ void default_range(const check_input &in, std::vector<explained> &out) {
         if (&s == attribute)
             check_attribute(s, out);
         else if (default_applies(*attribute))
-            check_stored_values(s, kw::DefaultValue, "ValidValue ranges",
-                                ranges_of(s, kw::ValidValue, lang::element_type_of(type_of(s))), out);
+            check_stored_values(s, kw::DefaultValue, kw::ValidValue, out);
     }
 }
 
