@@ -21,6 +21,7 @@ const char *HELP = "usage: qecfg-check [options] SOURCE...\n"
                    "and reports its error, with the detail qecfg's message leaves out, and the warnings:\n"
                    "  FILE:LINE: error: message\n"
                    "  FILE:LINE: warning: message [name]\n"
+                   "  FILE:LINE: note: a related place\n"
                    "\n"
                    "options:\n"
                    "  -W NAME        enable the warning NAME (all are enabled at first)\n"
@@ -33,7 +34,7 @@ const char *HELP = "usage: qecfg-check [options] SOURCE...\n"
                    "  --version      show the version and exit\n"
                    "\n"
                    "exit status: 0 no error (warnings allowed), 1 an error or, with -Werror, a warning,\n"
-                   "2 a usage error or a source that cannot be read\n";
+                   "2 a usage error, a source that cannot be read, or exhausted memory\n";
 
 enum status { CLEAN = 0, FINDING = 1, TROUBLE = 2 };
 
