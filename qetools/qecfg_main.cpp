@@ -24,8 +24,7 @@ int print(const std::string &text) {
     std::fputs(text.c_str(), stdout);
     if (std::fflush(stdout) == 0 && !std::ferror(stdout))
         return 0;
-    std::fprintf(stderr, "qecfg: cannot write the output: %s\n", std::strerror(errno));
-    return 1;
+    return report(std::string("qecfg: cannot write the output: ") + std::strerror(errno) + "\n", 1);
 }
 
 std::string usage(std::string text, const qecfg::options &opt) { return opt.message_newline ? text + "\n" : text; }
