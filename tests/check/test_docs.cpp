@@ -155,6 +155,7 @@ TEST(Generator, ManualPageEscapesRoffAndKeepsTables) {
     EXPECT_NE(man.find("\\&.dot \\fBa\\eb\\fR text\n"), std::string::npos);
     EXPECT_NE(man.find(".na\n.TS\nallbox;\nl lx.\nA\tT{\nB\nT}\n\\fBx\\fR\tT{\ny\nT}\n.TE\n.ad\n"), std::string::npos);
     EXPECT_NE(man.find(".nf\n\\&.code\\en\n.fi\n"), std::string::npos);
+    EXPECT_NE(man.find(".SH SEE ALSO\n.BR qecfg (1),\n.BR qecfg-check (1),\n.BR cdbdump (1)\n"), std::string::npos);
 }
 
 } // namespace

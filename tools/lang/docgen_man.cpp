@@ -167,6 +167,8 @@ std::string man_page(const std::string &markdown) {
     }
     if (!rows.empty())
         o << table(rows);
+    // The commands that read, check and compile the language.
+    o << ".SH SEE ALSO\n.BR qecfg (1),\n.BR qecfg-check (1),\n.BR cdbdump (1)\n";
     return o.str();
 }
 
