@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <span>
+#include <sstream>
 #include <string>
 
 namespace command_usage {
@@ -23,7 +24,6 @@ struct item {
 
 struct usage {
     const char *name;
-    const char *summary;                   // what the command does, one line
     std::span<const char *const> synopsis; // each form of the command line, after the name
     const char *description;               // one paragraph
     std::span<const item> options;
@@ -43,28 +43,21 @@ inline std::string plain(const char *marked) {
 }
 
 // Words of `text` filled into lines of at most `width` columns, each
-// starting with `indent`; the first line continues `first`.
-inline std::string filled(std::string first, const std::string &text, size_t indent, size_t width = 79) {
+// further line starting with `indent` blanks; the first continues `line`.
+inline std::string filled(std::string line, const std::string &text, size_t indent, size_t width = 79) {
     std::string out;
-    size_t col = first.size();
     bool line_empty = true;
-    for (size_t i = 0; i < text.size();) {
-        size_t end = text.find(' ', i);
-        std::string word = text.substr(i, end == std::string::npos ? std::string::npos : end - i);
-        i = end == std::string::npos ? text.size() : end + 1;
-        if (word.empty())
-            continue;
-        if (!line_empty && col + 1 + word.size() > width) {
-            out += first + "\n";
-            first = std::string(indent, ' ');
-            col = indent;
+    std::istringstream words(text);
+    for (std::string word; words >> word;) {
+        if (!line_empty && line.size() + 1 + word.size() > width) {
+            out += line + "\n";
+            line = std::string(indent, ' ');
             line_empty = true;
         }
-        first += (line_empty ? "" : " ") + word;
-        col += (line_empty ? 0 : 1) + word.size();
+        line += (line_empty ? "" : " ") + word;
         line_empty = false;
     }
-    return out + first + "\n";
+    return out + line + "\n";
 }
 
 // The items of one section, each term in a column of its own when it fits.

@@ -43,7 +43,6 @@ inline constexpr command_usage::item exit_statuses[] = {
 
 inline constexpr command_usage::usage usage = {
     "qecfg",
-    "compile a class definition source into a class definition database",
     synopsis,
     "Compiles one class definition source (stanzas of Name=value statements describing resource classes, "
     "their attributes, actions, structured data, the class-to-manager map and the variable classes) into "

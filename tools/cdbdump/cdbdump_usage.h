@@ -43,7 +43,6 @@ inline constexpr command_usage::item exit_statuses[] = {
 
 inline constexpr command_usage::usage usage = {
     "cdbdump",
-    "verify, print, compare and decompile class definition databases",
     synopsis,
     "Reads the CDB in {FILE}, in either byte order, and verifies all of it before printing anything: the "
     "length and checksum, the anchors, every dsect, record, list, string and value body. The first violation "

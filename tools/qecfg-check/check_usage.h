@@ -35,7 +35,6 @@ inline constexpr command_usage::item exit_statuses[] = {
 
 inline constexpr command_usage::usage usage = {
     "qecfg-check",
-    "check class definition sources without compiling them to a file",
     synopsis,
     "Compiles each class definition source in memory with exactly qecfg's rules, writes no file, and reports "
     "the error that stops the compile, with the detail qecfg's message leaves out, then warnings about "
