@@ -1,11 +1,14 @@
 // qecfg: compiles one class definition source into a class definition
 // database. The only place that prints a fatal message and exits.
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <string>
 #include <unistd.h>
 
 #include "qecfg/qecfg.h"
+#include "qecfg_usage.h"
 
 namespace {
 
@@ -15,11 +18,26 @@ int report(const std::string &message, int status) {
     return status;
 }
 
+// Standard output that cannot be written (a full disk, a closed pipe) is a
+// failure, not a silent success.
+int print(const std::string &text) {
+    std::fputs(text.c_str(), stdout);
+    if (std::fflush(stdout) == 0 && !std::ferror(stdout))
+        return 0;
+    return report(std::string("qecfg: cannot write the output: ") + std::strerror(errno) + "\n", 1);
+}
+
 std::string usage(std::string text, const qecfg::options &opt) { return opt.message_newline ? text + "\n" : text; }
 
 } // namespace
 
 int main(int argc, char **argv) {
+    // Only as the whole first argument: any other command line keeps the
+    // meaning getopt gives it.
+    if (argc > 1 && std::string(argv[1]) == "--help")
+        return print(command_usage::help_text(qecfg_usage::usage));
+    if (argc > 1 && std::string(argv[1]) == "--version")
+        return print("qecfg " QECFG_VERSION "\n");
     qecfg::options opt;
     int c;
     while ((c = getopt(argc, argv, "nd:s")) != -1) {

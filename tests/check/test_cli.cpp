@@ -22,7 +22,7 @@ struct cli_case {
 
 TEST(CommandLine, OptionsAndStatuses) {
     const cli_case cases[] = {
-        {{"--help"}, 0, "usage: qecfg-check [options] SOURCE...\n", ""},
+        {{"--help"}, 0, "usage: qecfg-check [-W NAME", ""},
         {{"-h"}, 0, "usage: qecfg-check", ""},
         {{"--version"}, 0, "qecfg-check ", ""},
         {{"-W", "list"}, 0, "locator                on   ", ""},

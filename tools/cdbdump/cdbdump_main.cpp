@@ -16,52 +16,13 @@
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
 #include "cdb_walk.h"
+#include "cdbdump_usage.h"
 
 using namespace cdbdump;
 
 namespace {
 const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
                           "       cdbdump --diff | --compat [--json] OLD NEW\n";
-
-const char help_text[] = "NAME\n"
-                         "    cdbdump - inspect, verify and decompile a class definition database (CDB)\n"
-                         "\n"
-                         "SYNOPSIS\n"
-                         "    cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
-                         "    cdbdump --diff | --compat [--json] OLD NEW\n"
-                         "\n"
-                         "DESCRIPTION\n"
-                         "    Reads the CDB in FILE (- for standard input), in either byte order, and\n"
-                         "    verifies all of it before printing anything: the length and checksum, the\n"
-                         "    anchors, every dsect, record, list, string and value body. The first\n"
-                         "    violation is reported as FILE: offset N: what is wrong.\n"
-                         "\n"
-                         "    Without an option, prints everything the file holds as indented text:\n"
-                         "    the header, the layout of the dsects, then each dsect.\n"
-                         "\n"
-                         "OPTIONS\n"
-                         "    --check      print nothing; only set the exit status\n"
-                         "    --json       print the same content as one JSON document\n"
-                         "    --annotate   print every byte range in order: offset, bytes, field and\n"
-                         "                 value; flag each violation where it stands (!!) instead of\n"
-                         "                 stopping at the first\n"
-                         "    --source     print a class definition source that the compiler turns\n"
-                         "                 back into a CDB of the same content; what no source can\n"
-                         "                 say is reported as a warning and as a comment in place\n"
-                         "    --diff       print the content differences of the CDBs OLD and NEW,\n"
-                         "                 keyed by names; layout, timestamp and byte order ignored\n"
-                         "    --compat     print the differences with the verdict of each: breaking\n"
-                         "                 when NEW would break what was stored or called with OLD\n"
-                         "                 (with --json: either as one JSON document)\n"
-                         "    -h, --help   print this text\n"
-                         "    --version    print the version\n"
-                         "\n"
-                         "EXIT STATUS\n"
-                         "    0  success (--diff: no difference; --compat: nothing breaks)\n"
-                         "    1  FILE is not a valid CDB (--annotate: violations were flagged;\n"
-                         "       --diff: the contents differ; --compat: a change breaks)\n"
-                         "    2  a usage error, FILE cannot be read, the output cannot be written,\n"
-                         "       or memory is exhausted\n";
 
 enum class mode { text, check, json, annotate, source, diff, compat };
 
@@ -167,7 +128,7 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
             continue;
         }
         if (a == "-h" || a == "--help") {
-            out << help_text;
+            out << command_usage::help_text(cdbdump_usage::usage);
             return 0;
         }
         if (a == "--version") {

@@ -5,6 +5,7 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 namespace docgen {
 
@@ -16,14 +17,30 @@ std::map<std::string, std::string> reference_blocks();
 // delimited by "<!-- generated: NAME -->" and "<!-- end generated -->" lines;
 // a block named in `blocks` that the text lacks, and a block of the text
 // that `blocks` does not name, are reported in `missing`.
+// `markers` gives the comment lines that delimit the blocks in another kind
+// of text.
+struct block_markers {
+    std::string start, start_end, end;
+};
+extern const block_markers markdown_markers, roff_markers;
 std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks,
-                        std::string &missing);
+                        std::string &missing, const block_markers &markers = markdown_markers);
 
 std::string vim_syntax();
 std::string textmate_grammar();
 
 // A section-5 manual page from the reference's Markdown.
 std::string man_page(const std::string &markdown);
+
+// A command's manual page (under the source tree) and its blocks generated
+// from the command's usage table: "synopsis", "options" (options and
+// operands), "environment" and "output" where it has them, and "exit-status". The blocks
+// are delimited by roff_markers.
+struct command_manual {
+    std::string path;
+    std::map<std::string, std::string> blocks;
+};
+std::vector<command_manual> command_manuals();
 
 } // namespace docgen
 

@@ -27,6 +27,18 @@ std::vector<std::string> keyword_names() {
     return {k.begin(), k.end()};
 }
 
+// The statements whose value is made of the words below: only there is a
+// word of the language one ("Name=State" names something).
+std::vector<std::string> word_keyword_names() {
+    std::set<std::string> k;
+    for (const lang::stanza_type &s : lang::stanza_types())
+        for (const lang::statement_row &r : s.rows)
+            if (r.kind == lang::value_kind::properties || r.kind == lang::value_kind::data_type ||
+                r.kind == lang::value_kind::element_type || r.kind == lang::value_kind::variable_type)
+                k.insert(r.name);
+    return {k.begin(), k.end()};
+}
+
 // The words that may stand in a value: data and variable type names and
 // property words.
 std::vector<std::string> value_words() {
@@ -63,8 +75,16 @@ std::string vim_syntax() {
       << "\" Statement keywords: the name up to the '=' of an indented line.\n"
       << "syn match qecfgUnknownKey \"^[ \\t]\\+\\zs[^=]*\\ze=\"\n"
       << "syn match qecfgKey \"^[ \\t]\\+\\zs\\%(" << join(keyword_names(), "\\|") << "\\)\\ze=\"\n"
-      << "syn keyword qecfgWord " << join(value_words(), " ") << "\n"
-      << "syn match qecfgNumber \"\\<-\\=\\%(0x\\x\\+\\|\\d\\+\\%(\\.\\d*\\)\\=\\%([eE][-+]\\=\\d\\+\\)\\=\\)\\>\"\n"
+      << "\" Type names and property words only in the values of the statements\n"
+      << "\" that take them.\n"
+      << "syn match qecfgWordKey \"^[ \\t]\\+\\zs\\%(" << join(word_keyword_names(), "\\|")
+      << "\\)\\ze=\" nextgroup=qecfgWordValue\n"
+      << "syn match qecfgWordValue \"=.*$\" contained contains=qecfgWord,qecfgString,qecfgComment\n"
+      << "syn keyword qecfgWord contained " << join(value_words(), " ") << "\n"
+      << "\" Numbers with their sign, and dotted versions as one number.\n"
+      << "syn match qecfgNumber "
+         "\"\\%([[:alnum:]_.]\\)\\@1<!-\\=\\%(0x\\x\\+\\|\\d\\+\\%(\\.\\d\\+\\)\\{2,}\\|\\d\\+\\%(\\."
+         "\\d*\\)\\=\\%([eE][-+]\\=\\d\\+\\)\\=\\)\\>\"\n"
       << "syn region qecfgString start=+\"+ end=+\"+ oneline\n"
       << "\" Comments: whole lines, and from #, // or /* outside quotes to the end.\n"
       << "syn match qecfgComment \"\\%(#\\|//\\|/\\*\\).*$\"\n\n"
@@ -72,6 +92,7 @@ std::string vim_syntax() {
       << "hi def link qecfgStanza Structure\n"
       << "hi def link qecfgUnknownKey Error\n"
       << "hi def link qecfgKey Identifier\n"
+      << "hi def link qecfgWordKey Identifier\n"
       << "hi def link qecfgWord Constant\n"
       << "hi def link qecfgNumber Number\n"
       << "hi def link qecfgString String\n"
@@ -109,8 +130,9 @@ std::string textmate_grammar() {
       << "  \"fileTypes\": [\"src\", \"cdefsrc\"],\n"
       << "  \"patterns\": [\n"
       << "    " << rule("comment.line.qecfg", "^[ \\t\"]*" + comment) << ",\n"
-      << "    { \"match\": " << json("^(" + join(stanza_names(), "|") + ")[ \\t]*(?=$|#|//|/\\*)")
-      << ", \"captures\": { \"1\": { \"name\": \"entity.name.section.stanza.qecfg\" } } },\n"
+      << "    { \"match\": " << json("^(" + join(stanza_names(), "|") + ")[ \\t]*(?:(" + comment + ")|$)")
+      << ", \"captures\": { \"1\": { \"name\": \"entity.name.section.stanza.qecfg\" },"
+      << " \"2\": { \"name\": \"comment.line.qecfg\" } } },\n"
       << "    " << rule("invalid.illegal.stanza.qecfg", "^[^ \\t].*$") << ",\n"
       << "    { \"begin\": " << json("^([ \\t]+)(?:(" + join(keyword_names(), "|") + ")|([^=]*))(=)")
       << ", \"end\": \"$\",\n"
@@ -121,7 +143,9 @@ std::string textmate_grammar() {
       << "        { \"name\": \"string.quoted.double.qecfg\", \"begin\": \"\\\"\", \"end\": \"\\\"\" },\n"
       << "        " << rule("comment.line.qecfg", comment) << ",\n"
       << "        " << rule("constant.language.qecfg", "\\b(" + join(value_words(), "|") + ")\\b") << ",\n"
-      << "        " << rule("constant.numeric.qecfg", "(?<![\\w.])-?(0x[0-9A-Fa-f]+|\\d+(\\.\\d*)?([eE][-+]?\\d+)?)\\b")
+      << "        "
+      << rule("constant.numeric.qecfg",
+              "(?<![\\w.])-?(0x[0-9A-Fa-f]+|\\d+(\\.\\d+){2,}|\\d+(\\.\\d*)?([eE][-+]?\\d+)?)\\b")
       << "\n"
       << "      ]\n"
       << "    }\n"

@@ -53,12 +53,24 @@ int main(int argc, char **argv) {
         std::fprintf(stderr, "%s: generated blocks to add or remove: %s\n", reference_path.c_str(), missing.c_str());
         return 1;
     }
-    const std::vector<generated_file> files = {
+    std::vector<generated_file> files = {
         {"docs/language.md", filled},
         {"docs/qecfg-src.5", docgen::man_page(filled)},
         {"editors/vim/syntax/qecfg.vim", docgen::vim_syntax()},
         {"editors/vscode/syntaxes/qecfg.tmLanguage.json", docgen::textmate_grammar()},
     };
+    for (const docgen::command_manual &m : docgen::command_manuals()) {
+        std::string path = dir + "/" + m.path, page;
+        if (!read_file(path, page)) {
+            std::fprintf(stderr, "qecfg_docgen: cannot read %s\n", path.c_str());
+            return 2;
+        }
+        files.push_back({m.path, docgen::fill_blocks(page, m.blocks, missing, docgen::roff_markers)});
+        if (!missing.empty()) {
+            std::fprintf(stderr, "%s: generated blocks to add or remove: %s\n", path.c_str(), missing.c_str());
+            return 1;
+        }
+    }
     int status = 0;
     for (const generated_file &f : files) {
         std::string path = dir + "/" + f.path, current;
@@ -66,7 +78,7 @@ int main(int argc, char **argv) {
         if (readable && current == f.text)
             continue;
         if (check) {
-            std::fprintf(stderr, "%s: out of date with the keyword table; run qecfg_docgen %s\n", path.c_str(),
+            std::fprintf(stderr, "%s: out of date with the tables it is generated from; run qecfg_docgen %s\n", path.c_str(),
                          dir.c_str());
             status = 1;
         } else if (!write_file(path, f.text)) {

@@ -88,15 +88,11 @@ std::map<std::string, std::string> reference_blocks() {
     return b;
 }
 
-namespace {
-
-const std::string BLOCK_START = "<!-- generated: ";
-const std::string BLOCK_END = "<!-- end generated -->";
-
-} // namespace
+const block_markers markdown_markers = {"<!-- generated: ", " -->", "<!-- end generated -->"};
+const block_markers roff_markers = {".\\\" generated: ", "", ".\\\" end generated"};
 
 std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks,
-                        std::string &missing) {
+                        std::string &missing, const block_markers &markers) {
     std::istringstream in(text);
     std::ostringstream out;
     std::map<std::string, bool> seen;
@@ -104,19 +100,20 @@ std::string fill_blocks(const std::string &text, const std::map<std::string, std
     for (std::string line; std::getline(in, line);) {
         if (skipping) {
             // The old body and its end line give way to the new ones.
-            skipping = line != BLOCK_END;
+            skipping = line != markers.end;
             continue;
         }
         out << line << '\n';
-        if (line.rfind(BLOCK_START, 0) != 0)
+        if (line.rfind(markers.start, 0) != 0 || line.size() < markers.start.size() + markers.start_end.size())
             continue;
-        std::string name = line.substr(BLOCK_START.size(), line.size() - BLOCK_START.size() - 4);
+        std::string name =
+            line.substr(markers.start.size(), line.size() - markers.start.size() - markers.start_end.size());
         auto it = blocks.find(name);
         if (it == blocks.end()) {
             missing += (missing.empty() ? "" : ", ") + ("unknown block " + name);
             continue;
         }
-        out << it->second << BLOCK_END << '\n';
+        out << it->second << markers.end << '\n';
         seen[name] = skipping = true;
     }
     for (const auto &[name, body] : blocks)

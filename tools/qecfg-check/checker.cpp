@@ -8,6 +8,7 @@
 #include <sys/stat.h>
 
 #include "check_source.h"
+#include "check_usage.h"
 #include "qecfg/qecfg.h"
 #include "warnings.h"
 
@@ -16,26 +17,6 @@ namespace check {
 namespace {
 
 const char *VERSION = "qecfg-check " QECFG_VERSION "\n";
-const char *HELP = "usage: qecfg-check [options] SOURCE...\n"
-                   "Compiles each class definition source in memory with qecfg's rules (no output file)\n"
-                   "and reports its error, with the detail qecfg's message leaves out, and the warnings:\n"
-                   "  FILE:LINE: error: message\n"
-                   "  FILE:LINE: warning: message [name]\n"
-                   "  FILE:LINE: note: a related place\n"
-                   "\n"
-                   "options:\n"
-                   "  -W NAME        enable the warning NAME (all are enabled at first)\n"
-                   "  -W no-NAME     disable the warning NAME\n"
-                   "  -Werror        treat warnings as errors\n"
-                   "  -W list        list the warnings and exit\n"
-                   "  -o NAME        the output file name qecfg would be given, after which a class\n"
-                   "                 without Name is named (default: SOURCE's name ending in .cdef)\n"
-                   "  -h, --help     show this help and exit\n"
-                   "  --version      show the version and exit\n"
-                   "\n"
-                   "exit status: 0 no error (warnings allowed), 1 an error or, with -Werror, a warning,\n"
-                   "2 a usage error, a source that cannot be read, or exhausted memory\n";
-
 enum status { CLEAN = 0, FINDING = 1, TROUBLE = 2 };
 
 struct settings {
@@ -84,7 +65,7 @@ bool parse_args(const std::vector<std::string> &args, settings &s, std::string &
         } else if (a == "--") {
             options_done = true;
         } else if (a == "-h" || a == "--help") {
-            out.put(HELP);
+            out.put(command_usage::help_text(check_usage::usage));
             exit_now = true;
             return true;
         } else if (a == "--version") {

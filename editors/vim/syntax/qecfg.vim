@@ -10,8 +10,13 @@ syn match qecfgStanza "^\%(ControlDefinition\|ClassToManagerMapping\|ResourceVar
 " Statement keywords: the name up to the '=' of an indented line.
 syn match qecfgUnknownKey "^[ \t]\+\zs[^=]*\ze="
 syn match qecfgKey "^[ \t]\+\zs\%(Alias\|ClassPermTemplate\|ConfirmationMsg\|DataType\|DefaultValue\|Description\|DescriptiveMessageSet\|DisplayName\|ElementIndex\|ElementName\|Expression\|ExpressionDescription\|FileVersion\|FirstKey\|GroupID\|GroupName\|Id\|InitialValue\|LastKey\|ListActionClass\|ListActionRsrc\|Locator\|MessageCatalog\|Name\|ObservationInterval\|Permission\|Properties\|Range\|ReArmDescription\|ReArmExpression\|ReportingInterval\|ResourceManager\|ResourcePermTemplate\|TimeOut\|ValidStateValue\|ValidValue\|ValueDisplayName\|VariableClass\|VariableType\|VarietyRange\)\ze="
-syn keyword qecfgWord Binary BinaryArray CanBatchDefine CanBatchSetAttr CanBatchUndefine CanControl CanDefine CanLiveUpdate Counter Float32 Float32Array Float64 Float64Array HasConstraints HasIWAccess HasResources Int32 Int32Array Int64 Int64Array InvalForDefine JoinPhase0 JoinPhase1 LongRun MtypCentral MtypDivided MtypGlobal None OptForDefine Public QELElectCoord QryReqsMonitoring Quantity Quantum RH RHArray ReadOnly ReqdForDefine SBS SD SDArray Select State String StringArray SupportsMove UInt32 UInt32Array UInt64 UInt64Array
-syn match qecfgNumber "\<-\=\%(0x\x\+\|\d\+\%(\.\d*\)\=\%([eE][-+]\=\d\+\)\=\)\>"
+" Type names and property words only in the values of the statements
+" that take them.
+syn match qecfgWordKey "^[ \t]\+\zs\%(DataType\|Properties\|VariableType\)\ze=" nextgroup=qecfgWordValue
+syn match qecfgWordValue "=.*$" contained contains=qecfgWord,qecfgString,qecfgComment
+syn keyword qecfgWord contained Binary BinaryArray CanBatchDefine CanBatchSetAttr CanBatchUndefine CanControl CanDefine CanLiveUpdate Counter Float32 Float32Array Float64 Float64Array HasConstraints HasIWAccess HasResources Int32 Int32Array Int64 Int64Array InvalForDefine JoinPhase0 JoinPhase1 LongRun MtypCentral MtypDivided MtypGlobal None OptForDefine Public QELElectCoord QryReqsMonitoring Quantity Quantum RH RHArray ReadOnly ReqdForDefine SBS SD SDArray Select State String StringArray SupportsMove UInt32 UInt32Array UInt64 UInt64Array
+" Numbers with their sign, and dotted versions as one number.
+syn match qecfgNumber "\%([[:alnum:]_.]\)\@1<!-\=\%(0x\x\+\|\d\+\%(\.\d\+\)\{2,}\|\d\+\%(\.\d*\)\=\%([eE][-+]\=\d\+\)\=\)\>"
 syn region qecfgString start=+"+ end=+"+ oneline
 " Comments: whole lines, and from #, // or /* outside quotes to the end.
 syn match qecfgComment "\%(#\|//\|/\*\).*$"
@@ -20,6 +25,7 @@ hi def link qecfgBadHeader Error
 hi def link qecfgStanza Structure
 hi def link qecfgUnknownKey Error
 hi def link qecfgKey Identifier
+hi def link qecfgWordKey Identifier
 hi def link qecfgWord Constant
 hi def link qecfgNumber Number
 hi def link qecfgString String
