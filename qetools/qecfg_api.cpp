@@ -1,5 +1,7 @@
 // The compiler as a library: a source and the command line's options in, an
 // image or the fatal message and status out.
+#include <cstring>
+
 #include "qecfg/qecfg.h"
 #include "qecfg.h"
 #include "qecfg_sink.h"
@@ -47,8 +49,14 @@ qecfg::result qecfg::compile_to_memory(const source &src, std::vector<std::uint8
 
 qecfg::result qecfg::compile_to_file(const source &src, const std::string &output_path, const options &o) {
     qecfg_options opt = compile_options(src, o, o.output_name.empty() ? output_path : o.output_name);
-    std::unique_ptr<image_sink> sink =
-        make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name));
+    std::unique_ptr<file_output> sink =
+        make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name), !o.skip_disk_flush);
+    // An output that cannot be written fails before the compile.
+    try {
+        sink->prepare();
+    } catch (const sink_failure &f) {
+        return {1, f.prefix + std::string(f.text ? f.text : std::strerror(f.err)) + (o.message_newline ? "\n" : "")};
+    }
     opt.sink = sink.get();
     return run(std::move(opt));
 }
