@@ -35,6 +35,17 @@ inline std::string attribute_stanzas(int attrs) {
 // BASE_SOURCE with `attrs` string attributes: the image grows with attrs.
 inline std::string attributes_source(int attrs) { return BASE_SOURCE + attribute_stanzas(attrs); }
 
+// A source large enough that its image takes a while to lay down.
+inline std::string large_source() {
+    std::string s = attributes_source(20000);
+    for (int cls = 1; cls < 6; cls++)
+        s += "ControlDefinition\n    FileVersion=1.0\nResourceClass\n    Description=1\n    DisplayName=2\n    "
+             "Properties=HasResources\n"
+             "    ClassPermTemplate=t\n    ResourcePermTemplate=t\n    Name=Test.Class" +
+             std::to_string(cls) + "\n" + attribute_stanzas(20000);
+    return s;
+}
+
 inline std::string image_of(const std::string &source) {
     compile_result r = compile_text(source);
     EXPECT_EQ(r.message, "");

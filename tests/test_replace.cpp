@@ -112,17 +112,6 @@ TEST_F(Replace, RacingCompilesLeaveOneOfTheirImages) {
     }
 }
 
-// A source large enough that its image takes a while to lay down.
-std::string large_source() {
-    std::string s = attributes_source(20000);
-    for (int cls = 1; cls < 6; cls++)
-        s += "ControlDefinition\n    FileVersion=1.0\nResourceClass\n    Description=1\n    DisplayName=2\n    "
-             "Properties=HasResources\n"
-             "    ClassPermTemplate=t\n    ResourcePermTemplate=t\n    Name=Test.Class" +
-             std::to_string(cls) + "\n" + attribute_stanzas(20000);
-    return s;
-}
-
 // Whether the process has a file of the directory mapped: it is filling the
 // image.
 bool maps_file_in(pid_t pid, const fs::path &dir) {
