@@ -1,9 +1,12 @@
 // Benchmark of the compiler at scale: generates valid sources of chosen sizes
 // and shapes, compiles each with the qecfg binary to a new name and over an
-// existing file (renamed over it after an fsync), and in-process to memory,
-// and reports the best wall and CPU (user + system) times of each, throughput,
-// peak memory and the ratio of the compile time to the floor: reading the
-// same file once in pieces of at most 254 characters, touching every byte.
+// existing file, and in-process to memory, and reports the best wall and CPU
+// (user + system) times of each, throughput, peak memory and the ratio of the
+// compile time to the floor: reading the same file once in pieces of at most
+// 254 characters, touching every byte. The cost of flushing the output file
+// and its directory to disk, for a new name and a replacement, is the
+// difference of the best in-process compiles to a file with and without the
+// flushes.
 //
 // Shapes: mixed (classes with attributes of every data type and their
 // values, actions, structured data and variable classes), classes (many bare
@@ -30,10 +33,9 @@ using clock_type = std::chrono::steady_clock;
 constexpr int ATTRS_PER_CLASS = 6000; // well below the 65535 records a table may hold
 
 const char *const SCALAR_VALUES[][2] = {
-    {"Int32", "-123456"},       {"UInt32", "4000000000"}, {"Int64", "-9000000000"},
-    {"UInt64", "18000000000"},  {"Float32", "1.5e3"},     {"Float64", "0x1p-3"},
-    {"String", "\"some text\""}, {"Binary", "0x00ff10aa"}, {"Int32Array", "7"},
-    {"StringArray", "elem"},    {"BinaryArray", "ab\\101"}, {"RH", nullptr},
+    {"Int32", "-123456"}, {"UInt32", "4000000000"}, {"Int64", "-9000000000"},    {"UInt64", "18000000000"},
+    {"Float32", "1.5e3"}, {"Float64", "0x1p-3"},    {"String", "\"some text\""}, {"Binary", "0x00ff10aa"},
+    {"Int32Array", "7"},  {"StringArray", "elem"},  {"BinaryArray", "ab\\101"},  {"RH", nullptr},
 };
 
 struct generator {
@@ -41,20 +43,24 @@ struct generator {
     int cls = 0, attr = 0;
 
     void element(const char *kind, const char *name, int idx, const char *type) {
-        std::fprintf(f, "%s\n    ElementName=%s\n    Description=1\n    DisplayName=2\n    ElementIndex=%d\n    DataType=%s\n",
-                     kind, name, idx, type);
+        std::fprintf(
+            f, "%s\n    ElementName=%s\n    Description=1\n    DisplayName=2\n    ElementIndex=%d\n    DataType=%s\n",
+            kind, name, idx, type);
     }
 
     void start_class() {
-        std::fprintf(f, "ControlDefinition\n    FileVersion=1.0.%d\nResourceClass\n    Description=1\n    DisplayName=2\n"
-                        "    Properties=HasResources,CanDefine\n    ClassPermTemplate=t\n    ResourcePermTemplate=t\n"
-                        "    Name=Bench.Class%d\n",
+        std::fprintf(f,
+                     "ControlDefinition\n    FileVersion=1.0.%d\nResourceClass\n    Description=1\n    DisplayName=2\n"
+                     "    Properties=HasResources,CanDefine\n    ClassPermTemplate=t\n    ResourcePermTemplate=t\n"
+                     "    Name=Bench.Class%d\n",
                      cls, cls);
         element("DefineSDDefinition", "Input", 0, "String");
         element("DefineSDDefinition", "Size", 1, "UInt64");
-        std::fprintf(f, "ResourceAction\n    Name=Act%d\n    Description=1\n    DisplayName=2\n    Id=1\n    VarietyRange=1,1\n"
-                        "    Permission=x\n",
-                     cls);
+        std::fprintf(
+            f,
+            "ResourceAction\n    Name=Act%d\n    Description=1\n    DisplayName=2\n    Id=1\n    VarietyRange=1,1\n"
+            "    Permission=x\n",
+            cls);
         element("ActionInSDDefinition", "Arg", 0, "Int32");
         cls++;
         attr = 0;
@@ -62,8 +68,9 @@ struct generator {
 
     void persistent(int i) {
         const char *const *tv = SCALAR_VALUES[i % (sizeof SCALAR_VALUES / sizeof SCALAR_VALUES[0])];
-        std::fprintf(f, "PersistentResourceAttribute\n    Name=Attr%d\n    Description=%d\n    DisplayName=%d\n    Id=%d\n"
-                        "    DataType=%s\n    VarietyRange=1,1\n    Properties=Public,ReqdForDefine\n",
+        std::fprintf(f,
+                     "PersistentResourceAttribute\n    Name=Attr%d\n    Description=%d\n    DisplayName=%d\n    Id=%d\n"
+                     "    DataType=%s\n    VarietyRange=1,1\n    Properties=Public,ReqdForDefine\n",
                      i, i & 0x7fff, i & 0x7fff, i, tv[0]);
         if (tv[1]) {
             std::fprintf(f, "    ValidValue=%s\n    ValueDisplayName=3\n", tv[1]);
@@ -72,15 +79,17 @@ struct generator {
     }
 
     void dynamic(int i) {
-        std::fprintf(f, "DynamicResourceAttribute\n    Name=Dyn%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
-                        "    DataType=Float64\n    VariableType=Quantity\n    VarietyRange=1,1\n    VariableClass=VC%d\n"
-                        "    Range=0,1000\n    InitialValue=1.25\n",
+        std::fprintf(f,
+                     "DynamicResourceAttribute\n    Name=Dyn%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
+                     "    DataType=Float64\n    VariableType=Quantity\n    VarietyRange=1,1\n    VariableClass=VC%d\n"
+                     "    Range=0,1000\n    InitialValue=1.25\n",
                      i, i, i % 4);
     }
 
     void structured(int i) {
-        std::fprintf(f, "PersistentClassAttribute\n    Name=Sd%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
-                        "    DataType=SD\n    VarietyRange=1,1\n",
+        std::fprintf(f,
+                     "PersistentClassAttribute\n    Name=Sd%d\n    Description=1\n    DisplayName=2\n    Id=%d\n"
+                     "    DataType=SD\n    VarietyRange=1,1\n",
                      i, i);
         element("PAttrSDDefinition", "A", 0, "Int32");
         element("PAttrSDDefinition", "B", 1, "String");
@@ -101,8 +110,9 @@ struct generator {
         std::fprintf(f, "ClassToManagerMapping\n    ResourceManager=Bench.RM\n    FirstKey=1\n    LastKey=100\n"
                         "    MessageCatalog=bench.cat\n    DescriptiveMessageSet=1\n");
         for (int v = 0; v < 4; v++)
-            std::fprintf(f, "ResourceVariableClass\n    VariableClass=VC%d\n    ObservationInterval=60\n"
-                            "    ReportingInterval=60\n",
+            std::fprintf(f,
+                         "ResourceVariableClass\n    VariableClass=VC%d\n    ObservationInterval=60\n"
+                         "    ReportingInterval=60\n",
                          v);
     }
 };
@@ -120,8 +130,9 @@ void generate(const std::string &path, size_t bytes, const std::string &shape) {
     } else if (shape == "varclasses") {
         g.start_class();
         for (int v = 4; size_t(std::ftell(f)) < bytes; v++)
-            std::fprintf(f, "ResourceVariableClass\n    VariableClass=VC%d\n    ObservationInterval=60\n"
-                            "    ReportingInterval=60\n",
+            std::fprintf(f,
+                         "ResourceVariableClass\n    VariableClass=VC%d\n    ObservationInterval=60\n"
+                         "    ReportingInterval=60\n",
                          v);
     } else {
         while (size_t(std::ftell(f)) < bytes)
@@ -184,6 +195,26 @@ int compile_to_memory(const std::string &src, const std::string &out) {
     return qecfg::compile_to_memory(qecfg::source::file(src), image, opt).status;
 }
 
+// Compiles to a new name (removing the output first) or over the output.
+int compile_to_file(const std::string &src, const std::string &out, bool replace, bool flush) {
+    if (!replace)
+        std::remove(out.c_str());
+    qecfg::options opt;
+    opt.skip_disk_flush = !flush;
+    return qecfg::compile_to_file(qecfg::source::file(src), out, opt).status;
+}
+
+// The time the flushes add: best with them less best without.
+struct flush_cost {
+    measure with, without;
+
+    void run(const std::string &src, const std::string &out, bool replace) {
+        run_child(with, [&] { return compile_to_file(src, out, replace, true); });
+        run_child(without, [&] { return compile_to_file(src, out, replace, false); });
+    }
+    double seconds() const { return with.wall - without.wall; }
+};
+
 } // namespace
 
 int main(int argc, char **argv) {
@@ -206,14 +237,14 @@ int main(int argc, char **argv) {
     }
     if (sizes.empty())
         sizes = {1, 10, 100};
-    std::printf("%-10s %9s %9s | %8s %8s %8s %9s | %8s %8s | %8s %8s %9s | %8s %9s %10s\n", "shape",
+    std::printf("%-10s %9s %9s | %8s %8s %8s %9s | %8s %8s | %8s %8s %9s | %8s %9s %10s | %9s %10s\n", "shape",
                 "source MB", "output MB", "new s", "cpu s", "MB/s", "RSS MB", "replace", "cpu s", "memory", "cpu s",
-                "RSS MB", "floor s",
-                "new/floor", "cpu/floor");
+                "RSS MB", "floor s", "new/floor", "cpu/floor", "flush new", "flush repl");
     for (double mb : sizes) {
         std::string src = dir + "/qecfg-bench.src", out = dir + "/qecfg-bench.cdef";
         generate(src, size_t(mb * 1e6), shape);
         measure fresh, replace, memory;
+        flush_cost flush_new, flush_replace;
         double fl = 1e30;
         for (int k = 0; k < runs; k++) {
             fl = std::min(fl, floor_seconds(src));
@@ -221,16 +252,21 @@ int main(int argc, char **argv) {
             run_child(fresh, [&] { return exec_qecfg(qecfg, src, out); });
             run_child(replace, [&] { return exec_qecfg(qecfg, src, out); });
             run_child(memory, [&] { return compile_to_memory(src, out); });
+            flush_new.run(src, out, false);
+            flush_replace.run(src, out, true);
         }
-        struct stat sb {}, ob {};
+        struct stat sb {
+        }, ob{};
         stat(src.c_str(), &sb);
         stat(out.c_str(), &ob);
         double src_mb = double(sb.st_size) / 1e6;
-        std::printf("%-10s %9.1f %9.1f | %8.3f %8.3f %8.1f %9.1f | %8.3f %8.3f | %8.3f %8.3f %9.1f | %8.3f %9.2f %10.2f\n",
-                    shape.c_str(), src_mb, double(ob.st_size) / 1e6, fresh.wall, fresh.cpu, src_mb / fresh.wall,
-                    double(fresh.max_rss_kb) / 1024.0, replace.wall, replace.cpu, memory.wall, memory.cpu,
-                    double(memory.max_rss_kb) / 1024.0, fl,
-                    fresh.wall / fl, fresh.cpu / fl);
+        std::printf(
+            "%-10s %9.1f %9.1f | %8.3f %8.3f %8.1f %9.1f | %8.3f %8.3f | %8.3f %8.3f %9.1f | %8.3f %9.2f %10.2f | "
+            "%9.3f %10.3f\n",
+            shape.c_str(), src_mb, double(ob.st_size) / 1e6, fresh.wall, fresh.cpu, src_mb / fresh.wall,
+            double(fresh.max_rss_kb) / 1024.0, replace.wall, replace.cpu, memory.wall, memory.cpu,
+            double(memory.max_rss_kb) / 1024.0, fl, fresh.wall / fl, fresh.cpu / fl, flush_new.seconds(),
+            flush_replace.seconds());
         std::remove(src.c_str());
         std::remove(out.c_str());
     }

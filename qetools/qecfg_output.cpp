@@ -148,7 +148,11 @@ bool shared_sticky(const struct stat &dir) { return (dir.st_mode & S_ISVTX) && (
 
 // The prefix of every temporary name of an output entry; a process id and a
 // random suffix follow it.
-std::string temporary_stem(const std::string &entry) { return "." + entry.substr(0, 100) + ".tmp-"; }
+std::string temporary_stem(const std::string &entry) {
+    std::string stem(1, '.');
+    stem.append(entry, 0, 100);
+    return stem.append(".tmp-");
+}
 
 std::string random_suffix() {
     static const char ALPHABET[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
@@ -253,9 +257,9 @@ class file_sink final : public file_output {
 void file_sink::open_directory(int at, const std::string &path) {
     size_t slash = path.rfind('/');
     std::string dir = slash == std::string::npos ? "." : slash == 0 ? "/" : path.substr(0, slash);
-    entry_ = slash == std::string::npos ? path : path.substr(slash + 1);
-    if (entry_.empty())
-        entry_ = ".";
+    // A name that ends in a slash designates the directory itself.
+    std::string entry = slash == std::string::npos ? path : path.substr(slash + 1);
+    entry_ = entry.empty() ? std::string(".") : std::move(entry);
     // A directory that cannot be read can still be written: it then cannot
     // be flushed or searched for stale temporary files.
     int fd = openat(at, dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
