@@ -25,16 +25,18 @@ struct fault_plan {
     long at = 0;
     int err = EIO;
     long calls = 0;
-
-    fault_plan() {
-        const char *spec = std::getenv("QECFG_FAULT");
-        if (spec)
-            std::sscanf(spec, "%31[^:]:%ld:%d", name, &at, &err);
-    }
+    bool read = false;
 };
 
+// Read at the first call once the environment is there (a sanitizer's
+// runtime makes calls before it is).
 fault_plan &plan() {
     static fault_plan p;
+    if (!p.read && environ) {
+        p.read = true;
+        if (const char *spec = std::getenv("QECFG_FAULT"))
+            std::sscanf(spec, "%31[^:]:%ld:%d", p.name, &p.at, &p.err);
+    }
     return p;
 }
 
