@@ -1,5 +1,7 @@
 // The compiler as a library: a source and the command line's options in, an
 // image or the fatal message and status out.
+#include <cstring>
+
 #include "qecfg/qecfg.h"
 #include "qecfg.h"
 #include "qecfg_sink.h"
@@ -47,8 +49,11 @@ qecfg::result qecfg::compile_to_memory(const source &src, std::vector<std::uint8
 
 qecfg::result qecfg::compile_to_file(const source &src, const std::string &output_path, const options &o) {
     qecfg_options opt = compile_options(src, o, o.output_name.empty() ? output_path : o.output_name);
-    std::unique_ptr<image_sink> sink =
-        make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name));
+    std::unique_ptr<file_output> sink =
+        make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name), !o.skip_disk_flush);
+    // The output is checked where the image is first asked for, after the
+    // source compiled: an error of the source is reported before one of the
+    // output, as it always was.
     opt.sink = sink.get();
     return run(std::move(opt));
 }

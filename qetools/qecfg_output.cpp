@@ -1,23 +1,34 @@
 // The sinks of a compile's image: a caller's buffer, or a file.
 //
 // A file is replaced atomically where it can be: the image goes to a new
-// temporary file beside the output, which is renamed over the output name
-// once complete, so that readers of the old file keep a consistent image and
-// a new open sees the whole new one. Where no temporary file can be created
-// (a directory without write permission, a read-only file system) or the
-// output is not a regular file, the output is written in place as it always
-// was.
+// temporary file in the output's directory (unnamed where the file system
+// has unnamed files, so that nothing can open it and a killed compile leaves
+// nothing), which takes the output's name once complete and flushed, so that
+// readers of the old file keep a consistent image and a new open sees the
+// whole new one. Where no temporary file can be created (a directory without
+// write permission, a read-only file system) or the output is not a regular
+// file, the output is written in place as it always was.
+//
+// The directory may be shared with other users: a symbolic link at the name
+// is followed only where the kernel's rule for sticky directories would follow
+// it, the temporary file is never open to others, and neither the owner nor
+// the set-ID bits of a file another user placed there carry over.
 #include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <climits>
 #include <csignal>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <dirent.h>
 #include <fcntl.h>
+#include <fstream>
 #include <new>
+#include <optional>
 #include <pthread.h>
 #include <sys/mman.h>
+#include <sys/random.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -31,27 +42,31 @@ const char EXTEND[] = "Cannot extend CDB file: ";
 const char MAP[] = "Cannot map CDB file: ";
 const char WRITE[] = "Cannot write CDB file: ";
 
-[[noreturn]] void fail(const char *prefix, int err) { throw sink_failure{prefix, err}; }
+[[noreturn]] void fail(const char *prefix, int err, const char *text = nullptr) {
+    throw sink_failure{prefix, err, text};
+}
 
 // ---------------------------------------------------------------------------
-// Temporary files that a terminating signal must remove. The handler only
-// reads armed slots, so registering and releasing need no lock.
+// Named temporary files that a terminating signal must remove. The handler
+// only reads armed slots, so registering and releasing need no lock.
 
 constexpr int SLOTS = 16;
 enum slot_state : int { SLOT_FREE, SLOT_FILLING, SLOT_ARMED };
 struct temp_slot {
     std::atomic<int> state{SLOT_FREE};
-    char path[PATH_MAX];
+    int dir = -1;
+    char name[NAME_MAX + 1];
 };
 temp_slot temp_slots[SLOTS];
 
-int register_temporary(const std::string &path) {
-    if (path.size() >= PATH_MAX)
+int register_temporary(int dir, const std::string &name) {
+    if (name.size() > NAME_MAX)
         return -1;
     for (int i = 0; i < SLOTS; i++) {
         int expected = SLOT_FREE;
         if (temp_slots[i].state.compare_exchange_strong(expected, SLOT_FILLING)) {
-            std::memcpy(temp_slots[i].path, path.c_str(), path.size() + 1);
+            temp_slots[i].dir = dir;
+            std::memcpy(temp_slots[i].name, name.c_str(), name.size() + 1);
             temp_slots[i].state.store(SLOT_ARMED);
             return i;
         }
@@ -64,26 +79,32 @@ void release_temporary(int slot) {
         temp_slots[slot].state.store(SLOT_FREE);
 }
 
-const int CLEANUP_SIGNALS[] = {SIGINT, SIGTERM, SIGHUP};
+// Every signal that can be caught and whose default action ends the process.
+template <typename F> void for_each_cleanup_signal(F f) {
+    for (int s : {SIGHUP,  SIGINT,  SIGQUIT, SIGILL,    SIGTRAP, SIGABRT,   SIGBUS,  SIGFPE, SIGUSR1, SIGSEGV, SIGUSR2,
+                  SIGPIPE, SIGALRM, SIGTERM, SIGSTKFLT, SIGXCPU, SIGVTALRM, SIGPROF, SIGIO,  SIGPWR,  SIGSYS})
+        f(s);
+    for (int s = SIGRTMIN; s <= SIGRTMAX; s++)
+        f(s);
+}
 
 extern "C" void remove_temporaries_and_die(int sig) {
     for (temp_slot &s : temp_slots)
         if (s.state.load() == SLOT_ARMED)
-            unlink(s.path);
+            unlinkat(s.dir, s.name, 0);
     // The handler was reset to the default: the signal, pending until the
     // handler returns, then ends the process as it would have.
     raise(sig);
 }
 
-// Holds the cleanup signals back while a temporary file is created and
+// Holds the cleanup signals back while a temporary name is created and
 // registered, so that none can be left behind unregistered.
 class signals_held {
   public:
     signals_held() {
         sigset_t set;
         sigemptyset(&set);
-        for (int s : CLEANUP_SIGNALS)
-            sigaddset(&set, s);
+        for_each_cleanup_signal([&](int s) { sigaddset(&set, s); });
         pthread_sigmask(SIG_BLOCK, &set, &old_);
     }
     ~signals_held() { pthread_sigmask(SIG_SETMASK, &old_, nullptr); }
@@ -93,150 +114,320 @@ class signals_held {
 };
 
 // ---------------------------------------------------------------------------
-// Names.
+// The process and its names.
 
-std::string directory_of(const std::string &path) {
-    size_t slash = path.rfind('/');
-    if (slash == std::string::npos)
-        return ".";
-    return slash == 0 ? "/" : path.substr(0, slash);
+// A number of this process's status file ("Umask", "CapEff") in its base.
+std::optional<unsigned long long> process_status(const std::string &key, int base) {
+    std::ifstream in("/proc/self/status");
+    for (std::string line; std::getline(in, line);)
+        if (line.rfind(key + ":", 0) == 0)
+            return std::strtoull(line.c_str() + key.size() + 1, nullptr, base);
+    return std::nullopt;
 }
 
-std::string base_of(const std::string &path) {
-    size_t slash = path.rfind('/');
-    return slash == std::string::npos ? path : path.substr(slash + 1);
-}
-
-// The file a name designates once symbolic links are followed; a dangling
-// link designates the file it names, which the output then creates.
-std::string resolve_links(std::string path) {
-    for (int depth = 0; depth < 40; depth++) {
-        struct stat st;
-        if (lstat(path.c_str(), &st) != 0 || !S_ISLNK(st.st_mode))
-            return path;
-        std::string target(size_t(st.st_size > 0 ? st.st_size : PATH_MAX), '\0');
-        ssize_t n = readlink(path.c_str(), target.data(), target.size());
-        if (n < 0)
-            return path;
-        target.resize(size_t(n));
-        path = target.front() == '/' ? target : directory_of(path) + "/" + target;
+// The mode a new output gets: 0644 before the umask.
+mode_t new_file_mode() {
+    std::optional<unsigned long long> mask = process_status("Umask", 8);
+    if (!mask) {
+        mode_t m = umask(022);
+        umask(m);
+        mask = m;
     }
-    return path; // a loop: opening it reports the error
+    return 0644 & ~mode_t(*mask);
 }
 
-// Gives a file the owner and group of another, or failing that the group
-// alone; where neither is allowed it keeps this process's.
-void carry_owner(int fd, const struct stat &old) {
-    if (old.st_uid == geteuid() && old.st_gid == getegid())
+// Whether this process may rename over another user's file in a sticky
+// directory: the capability to bypass ownership checks.
+bool may_override_owner() {
+    constexpr int CAP_FOWNER_BIT = 3;
+    std::optional<unsigned long long> caps = process_status("CapEff", 16);
+    return caps ? (*caps >> CAP_FOWNER_BIT & 1) != 0 : geteuid() == 0;
+}
+
+bool shared_sticky(const struct stat &dir) { return (dir.st_mode & S_ISVTX) && (dir.st_mode & S_IWOTH); }
+
+// The prefix of every temporary name of an output entry; a process id and a
+// random suffix follow it.
+std::string temporary_stem(const std::string &entry) {
+    std::string stem(1, '.');
+    stem.append(entry, 0, 100);
+    return stem.append(".tmp-");
+}
+
+std::string random_suffix() {
+    static const char ALPHABET[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
+    unsigned char bytes[12];
+    if (getrandom(bytes, sizeof bytes, 0) != ssize_t(sizeof bytes)) {
+        static std::atomic<unsigned> serial{0};
+        unsigned n = serial++;
+        std::memcpy(bytes, &n, sizeof n);
+    }
+    std::string s;
+    for (unsigned char b : bytes)
+        s += ALPHABET[b % (sizeof ALPHABET - 1)];
+    return s;
+}
+
+// Removes this user's temporary files of an output whose compile no longer
+// runs (a compile killed before it could clean up). Housekeeping: what
+// cannot be read or removed stays.
+void remove_stale_temporaries(int dir, const std::string &entry) {
+    int fd = openat(dir, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0)
         return;
-    if (fchown(fd, old.st_uid, old.st_gid) != 0)
-        (void)!fchown(fd, uid_t(-1), old.st_gid);
+    DIR *d = fdopendir(fd);
+    if (!d) {
+        close(fd);
+        return;
+    }
+    const std::string stem = temporary_stem(entry);
+    while (const dirent *e = readdir(d)) {
+        std::string name = e->d_name;
+        if (name.compare(0, stem.size(), stem) != 0)
+            continue;
+        char *end = nullptr;
+        long pid = std::strtol(name.c_str() + stem.size(), &end, 10);
+        if (pid <= 0 || *end != '-' || pid == getpid() || kill(pid_t(pid), 0) == 0 || errno != ESRCH)
+            continue;
+        struct stat st;
+        if (fstatat(dir, e->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(st.st_mode) && st.st_uid == geteuid())
+            unlinkat(dir, e->d_name, 0);
+    }
+    closedir(d);
 }
 
 // ---------------------------------------------------------------------------
 
-class file_sink final : public image_sink {
+class file_sink final : public file_output {
   public:
-    file_sink(std::string path, file_identity source) : name_(std::move(path)), source_(source) {}
-    ~file_sink() override { abandon(); }
+    file_sink(std::string path, file_identity source, bool flush)
+        : name_(std::move(path)), source_(source), flush_(flush) {}
+    ~file_sink() override {
+        abandon();
+        if (dir_ >= 0)
+            close(dir_);
+    }
+    void prepare() override;
     char *acquire(size_t size) override;
     void commit(size_t length) override;
     void abandon() noexcept override;
 
   private:
-    void open_output();
+    [[noreturn]] void refuse(int err, const std::string &reason);
+    bool locate();
+    void open_directory(int at, const std::string &path);
+    void check_replaceable();
     int create_temporary();
+    int create_named_temporary();
+    void give_final_mode();
     void open_in_place();
     void extend(size_t size);
-    void replace_output();
+    void publish();
+    void name_temporary();
+    void close_file(const char *prefix);
+    void drop_temporary_name() noexcept;
 
-    std::string name_;       // as given
-    std::string target_;     // the file that name designates
-    std::string temp_;       // the temporary file, when not written in place
+    std::string name_; // as given
     file_identity source_;
-    struct stat old_ {};     // the file being replaced, when replaces_
+    bool flush_;
+    bool prepared_ = false;
+    int dir_ = -1; // the directory of the file the name designates
+    bool dir_readable_ = false;
+    struct stat dir_st_ {};
+    std::string entry_;  // that file's name in dir_
+    struct stat old_ {}; // the file being replaced, when replaces_
     bool replaces_ = false;
+    bool in_place_ = false;
     int fd_ = -1;
+    bool unnamed_ = false; // the temporary file has no name yet
+    std::string temp_;     // the temporary file's name in dir_, once it has one
     int slot_ = -1;
     void *map_ = nullptr;
     size_t mapped_ = 0;
     bool regular_ = false;
+    std::string reason_; // the text of a refusal
 };
 
-void file_sink::open_output() {
-    target_ = resolve_links(name_);
-    struct stat st;
-    bool exists = stat(target_.c_str(), &st) == 0;
-    if (exists && source_.known && st.st_dev == source_.dev && st.st_ino == source_.ino)
-        throw sink_failure{CREATE, 0, "Output is the source file"};
-    if (exists && !S_ISREG(st.st_mode))
-        return open_in_place();
+[[noreturn]] void file_sink::refuse(int err, const std::string &reason) {
+    reason_ = std::string(std::strerror(err)) + ": " + reason;
+    fail(CREATE, err, reason_.c_str());
+}
+
+// Opens the directory part of path (relative to `at`) as dir_.
+void file_sink::open_directory(int at, const std::string &path) {
+    size_t slash = path.rfind('/');
+    std::string dir = slash == std::string::npos ? "." : slash == 0 ? "/" : path.substr(0, slash);
+    // A name that ends in a slash designates the directory itself.
+    std::string entry = slash == std::string::npos ? path : path.substr(slash + 1);
+    entry_ = entry.empty() ? std::string(".") : std::move(entry);
+    // A directory that cannot be read can still be written: it then cannot
+    // be flushed or searched for stale temporary files.
+    int fd = openat(at, dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    dir_readable_ = fd >= 0;
+    if (fd < 0 && errno == EACCES)
+        fd = openat(at, dir.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0)
+        fail(CREATE, errno);
+    if (dir_ >= 0)
+        close(dir_);
+    dir_ = fd;
+    if (fstat(dir_, &dir_st_) != 0)
+        fail(CREATE, errno);
+}
+
+// Finds the file the name designates, following symbolic links where the
+// kernel's protection of sticky directories would: in a sticky,
+// world-writable directory only a link of this user or of the directory's
+// owner. Returns whether that file exists (then old_ describes it).
+bool file_sink::locate() {
+    std::string path = name_;
+    int at = AT_FDCWD;
+    for (int depth = 0;; depth++) {
+        open_directory(at, path);
+        at = dir_;
+        if (fstatat(dir_, entry_.c_str(), &old_, AT_SYMLINK_NOFOLLOW) != 0) {
+            if (errno != ENOENT)
+                fail(CREATE, errno);
+            return false;
+        }
+        if (!S_ISLNK(old_.st_mode))
+            return true;
+        if (shared_sticky(dir_st_) && old_.st_uid != geteuid() && old_.st_uid != dir_st_.st_uid)
+            refuse(EACCES, "the symbolic link " + path + " belongs to another user of a sticky directory");
+        if (depth == 40)
+            fail(CREATE, ELOOP);
+        std::string target(size_t(old_.st_size > 0 ? old_.st_size : PATH_MAX) + 1, '\0');
+        ssize_t n = readlinkat(dir_, entry_.c_str(), target.data(), target.size());
+        if (n < 0)
+            fail(CREATE, errno);
+        target.resize(std::min(size_t(n), target.size()));
+        path = target;
+    }
+}
+
+// A sticky directory lets only the owners of a file, of the directory, or a
+// privileged process replace it: found out now rather than after the compile.
+void file_sink::check_replaceable() {
+    if ((dir_st_.st_mode & S_ISVTX) && old_.st_uid != geteuid() && dir_st_.st_uid != geteuid() && !may_override_owner())
+        refuse(EPERM, entry_ + " belongs to another user of a sticky directory");
+}
+
+void file_sink::prepare() {
+    if (prepared_)
+        return;
+    prepared_ = true;
+    bool exists = locate();
+    if (exists && source_.known && old_.st_dev == source_.dev && old_.st_ino == source_.ino)
+        fail(CREATE, 0, "Output is the source file");
+    if (exists && !S_ISREG(old_.st_mode)) {
+        in_place_ = true;
+        return;
+    }
     // A file this process may not write stays as protected as it was.
-    if (exists && faccessat(AT_FDCWD, target_.c_str(), W_OK, AT_EACCESS) != 0)
+    if (exists && faccessat(dir_, entry_.c_str(), W_OK, AT_EACCESS) != 0)
         fail(CREATE, errno);
     replaces_ = exists;
     if (replaces_)
-        old_ = st;
+        check_replaceable();
+    remove_stale_temporaries(dir_, entry_);
     int err = create_temporary();
-    if (err == EACCES || err == EPERM || err == EROFS)
-        return open_in_place();
+    if (err == EACCES || err == EPERM || err == EROFS) {
+        // No temporary file here: a new output could not be created either.
+        if (!exists)
+            fail(CREATE, err);
+        in_place_ = true;
+        return;
+    }
     if (err)
         fail(CREATE, err);
+    regular_ = true;
+    give_final_mode();
 }
 
-// Creates the temporary file beside the output: exclusively, 0644 before the
-// umask like the output itself. Its name starts with a dot and never equals
-// the output's. Returns 0 or the error number.
+// Creates the temporary file in the output's directory with no access for
+// others: unnamed where the file system allows it, otherwise under a name
+// that starts with a dot, holds this process's id and a random suffix, and
+// never equals the output's. Returns 0 or the error number.
 int file_sink::create_temporary() {
-    static std::atomic<unsigned> serial{0};
-    std::string stem = directory_of(target_) + "/." + base_of(target_).substr(0, 100) + ".tmp-" +
-                       std::to_string(getpid()) + "-";
+    int fd = openat(dir_, ".", O_TMPFILE | O_RDWR | O_CLOEXEC, 0600);
+    if (fd >= 0) {
+        fd_ = fd;
+        unnamed_ = true;
+        return 0;
+    }
+    if (errno != EOPNOTSUPP && errno != EISDIR)
+        return errno;
+    return create_named_temporary();
+}
+
+int file_sink::create_named_temporary() {
+    const std::string stem = temporary_stem(entry_) + std::to_string(getpid()) + "-";
     for (int tries = 0; tries < 100; tries++) {
-        std::string path = stem + std::to_string(serial++);
+        std::string name = stem + random_suffix();
         signals_held held;
-        int fd = open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0644);
+        int fd = openat(dir_, name.c_str(), O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
         if (fd < 0 && errno == EEXIST)
             continue;
         if (fd < 0)
             return errno;
         fd_ = fd;
-        temp_ = path;
-        slot_ = register_temporary(path);
-        regular_ = true;
+        temp_ = name;
+        slot_ = register_temporary(dir_, name);
         return 0;
     }
     return EEXIST;
 }
 
+// Before a byte of the image is written: a replaced file's permission bits
+// without set-user-ID and set-group-ID, and its owner and group where this
+// process may set them; a new file's 0644 before the umask. In a sticky,
+// world-writable directory only a file of this user carries anything over,
+// and nothing is given to another user.
+void file_sink::give_final_mode() {
+    bool carry = replaces_ && (!shared_sticky(dir_st_) || old_.st_uid == geteuid());
+    mode_t mode = carry ? old_.st_mode & 07777 & ~mode_t(S_ISUID | S_ISGID) : new_file_mode();
+    if (carry && !shared_sticky(dir_st_) && (old_.st_uid != geteuid() || old_.st_gid != getegid())) {
+        if (fchown(fd_, old_.st_uid, old_.st_gid) != 0) {
+            if (errno != EPERM)
+                fail(CREATE, errno);
+            // Not allowed to give it away: the group alone, where allowed.
+            if (fchown(fd_, uid_t(-1), old_.st_gid) != 0 && errno != EPERM)
+                fail(CREATE, errno);
+        }
+    }
+    if (fchmod(fd_, mode) != 0)
+        fail(CREATE, errno);
+}
+
 void file_sink::open_in_place() {
     // Non-blocking, so that a FIFO named as output fails instead of hanging.
-    int fd = open(name_.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_NONBLOCK | O_CLOEXEC, 0644);
+    int fd = openat(dir_, entry_.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC, 0644);
     if (fd < 0)
         fail(CREATE, errno);
     fd_ = fd;
     struct stat st;
-    regular_ = fstat(fd, &st) == 0 && S_ISREG(st.st_mode);
+    if (fstat(fd, &st) != 0)
+        fail(CREATE, errno);
+    regular_ = S_ISREG(st.st_mode);
 }
 
 // Reserves the file's blocks, so that a full disk shows here and not as a
-// fault while the mapping is filled. A fresh temporary file has them
-// allocated by the file system where it can; otherwise zeros are written in
-// whole blocks of EXTEND_BLOCK bytes, many blocks at a time.
+// fault while the mapping is filled. A regular file has them allocated by
+// the file system where it can; otherwise zeros are written in whole blocks
+// of EXTEND_BLOCK bytes, many blocks at a time.
 void file_sink::extend(size_t size) {
     constexpr size_t EXTEND_BLOCK = 1024;
-    mapped_ = 0;
-    if (!temp_.empty()) {
+    size_t reserved = 0;
+    if (regular_) {
         int err = posix_fallocate(fd_, 0, off_t(size));
-        if (err == 0) {
-            mapped_ = size;
-            return;
-        }
-        if (err != EOPNOTSUPP && err != EINVAL)
+        if (err == 0)
+            reserved = size;
+        else if (err != EOPNOTSUPP && err != EINVAL)
             fail(EXTEND, err);
     }
     static const char zeros[EXTEND_BLOCK * 256] = {};
-    while (mapped_ < size) {
-        size_t blocks = std::min<size_t>((size - mapped_ + EXTEND_BLOCK - 1) / EXTEND_BLOCK, 256);
+    while (reserved < size) {
+        size_t blocks = std::min<size_t>((size - reserved + EXTEND_BLOCK - 1) / EXTEND_BLOCK, 256);
         size_t want = blocks * EXTEND_BLOCK, done = 0;
         while (done < want) {
             ssize_t n = write(fd_, zeros + done, want - done);
@@ -246,18 +437,21 @@ void file_sink::extend(size_t size) {
                 fail(EXTEND, n < 0 ? errno : ENOSPC);
             done += size_t(n);
         }
-        mapped_ += want;
+        reserved += want;
     }
+    // Filling a mapping beyond the end of the file would be a fatal fault.
     struct stat st;
     if (fstat(fd_, &st) != 0)
         fail(MAP, errno);
     if (st.st_size < off_t(size))
-        fail(MAP, EINVAL);
+        fail(regular_ ? EXTEND : MAP, EINVAL, regular_ ? "File shorter than its reserved size" : nullptr);
     mapped_ = size_t(st.st_size);
 }
 
 char *file_sink::acquire(size_t size) {
-    open_output();
+    prepare();
+    if (in_place_)
+        open_in_place();
     extend(size);
     void *p = mmap(nullptr, mapped_, PROT_READ | PROT_WRITE, MAP_SHARED, fd_, 0);
     if (p == MAP_FAILED)
@@ -266,24 +460,50 @@ char *file_sink::acquire(size_t size) {
     return static_cast<char *>(p);
 }
 
-// The old file's permission bits, owner and group carry over (the owner only
-// where the process may set it); the image reaches the disk before its name
-// does, so that a crash leaves the old file or the new one.
-void file_sink::replace_output() {
-    if (replaces_) {
-        carry_owner(fd_, old_);
-        if (fchmod(fd_, old_.st_mode & 07777) != 0 || fsync(fd_) != 0)
+// Gives the unnamed temporary file a temporary name, from which it is
+// renamed over the output (a link cannot replace a name).
+void file_sink::name_temporary() {
+    const std::string stem = temporary_stem(entry_) + std::to_string(getpid()) + "-";
+    const std::string by_proc = "/proc/self/fd/" + std::to_string(fd_);
+    for (int tries = 0; tries < 100; tries++) {
+        std::string name = stem + random_suffix();
+        signals_held held;
+        int r = linkat(AT_FDCWD, by_proc.c_str(), dir_, name.c_str(), AT_SYMLINK_FOLLOW);
+        if (r != 0 && errno == ENOENT) // no /proc: allowed to privileged processes
+            r = linkat(fd_, "", dir_, name.c_str(), AT_EMPTY_PATH);
+        if (r != 0 && errno == EEXIST)
+            continue;
+        if (r != 0)
             fail(WRITE, errno);
+        unnamed_ = false;
+        temp_ = name;
+        slot_ = register_temporary(dir_, name);
+        return;
     }
+    fail(WRITE, EEXIST);
+}
+
+void file_sink::close_file(const char *prefix) {
     int fd = fd_;
     fd_ = -1;
     if (close(fd) != 0)
-        fail(WRITE, errno);
-    if (rename(temp_.c_str(), target_.c_str()) != 0)
+        fail(prefix, errno);
+}
+
+// The image reached the disk before its name does (flush_), so that a crash
+// leaves the old file or the new one; the directory is flushed after, so that
+// the name stays once commit has returned.
+void file_sink::publish() {
+    if (unnamed_)
+        name_temporary();
+    close_file(WRITE);
+    if (renameat(dir_, temp_.c_str(), dir_, entry_.c_str()) != 0)
         fail(WRITE, errno);
     release_temporary(slot_);
     slot_ = -1;
     temp_.clear();
+    if (flush_ && dir_readable_ && fsync(dir_) != 0)
+        fail(WRITE, errno);
 }
 
 void file_sink::commit(size_t length) {
@@ -293,16 +513,25 @@ void file_sink::commit(size_t length) {
         fail(WRITE, errno);
     if (regular_ && ftruncate(fd_, off_t(length)) != 0)
         fail(WRITE, errno);
-    if (!temp_.empty())
-        return replace_output();
-    int fd = fd_;
-    fd_ = -1;
-    if (close(fd) != 0)
+    if (flush_ && regular_ && fsync(fd_) != 0)
         fail(WRITE, errno);
+    if (in_place_)
+        return close_file(WRITE);
+    publish();
 }
 
-// A temporary file is removed; an output written in place is removed when it
-// is a regular file (never a device or a FIFO named as output).
+void file_sink::drop_temporary_name() noexcept {
+    if (temp_.empty())
+        return;
+    unlinkat(dir_, temp_.c_str(), 0);
+    release_temporary(slot_);
+    slot_ = -1;
+    temp_.clear();
+}
+
+// A temporary file is removed (an unnamed one goes with its descriptor); an
+// output written in place is removed when it is a regular file (never a
+// device or a FIFO named as output).
 void file_sink::abandon() noexcept {
     if (map_) {
         munmap(map_, mapped_);
@@ -311,15 +540,10 @@ void file_sink::abandon() noexcept {
     if (fd_ >= 0) {
         close(fd_);
         fd_ = -1;
-        if (temp_.empty() && regular_)
-            unlink(target_.c_str());
+        if (in_place_ && regular_)
+            unlinkat(dir_, entry_.c_str(), 0);
     }
-    if (!temp_.empty()) {
-        unlink(temp_.c_str());
-        release_temporary(slot_);
-        slot_ = -1;
-        temp_.clear();
-    }
+    drop_temporary_name();
 }
 
 } // namespace
@@ -342,8 +566,8 @@ void memory_sink::abandon() noexcept {
     out_.shrink_to_fit();
 }
 
-std::unique_ptr<image_sink> make_file_sink(const std::string &path, file_identity source) {
-    return std::make_unique<file_sink>(path, source);
+std::unique_ptr<file_output> make_file_sink(const std::string &path, file_identity source, bool flush) {
+    return std::make_unique<file_sink>(path, source, flush);
 }
 
 file_identity identity_of(const std::string &path) {
@@ -358,11 +582,13 @@ void qecfg::remove_temporary_files_on_signals() {
     sa.sa_handler = remove_temporaries_and_die;
     sa.sa_flags = SA_RESETHAND;
     sigemptyset(&sa.sa_mask);
-    for (int s : CLEANUP_SIGNALS) {
+    for_each_cleanup_signal([&](int s) { sigaddset(&sa.sa_mask, s); });
+    for_each_cleanup_signal([&](int s) {
         struct sigaction old {};
-        // A signal the process was started ignoring stays ignored.
-        if (sigaction(s, nullptr, &old) == 0 && old.sa_handler != SIG_IGN)
+        // A signal the process was started ignoring stays ignored, and a
+        // handler already installed (a sanitizer's) stays in place.
+        if (sigaction(s, nullptr, &old) == 0 && old.sa_handler == SIG_DFL)
             sigaction(s, &sa, nullptr);
-    }
+    });
     signal(SIGXFSZ, SIG_IGN);
 }

@@ -53,14 +53,19 @@ inline constexpr command_usage::usage usage = {
     environment,
     exit_statuses,
     "An existing regular output file, or the file a symbolic link names, is replaced atomically: the CDB is "
-    "written to a new temporary file in the same directory, flushed to disk, given the old file's permission "
-    "bits (and owner and group where allowed) and renamed over the name. Readers of the old file keep a "
-    "consistent old image; a new open sees the complete new one. Any failure, and SIGINT, SIGTERM or SIGHUP "
-    "during the compile, remove the temporary file and leave the output as it was. SIGKILL may leave a "
-    "temporary file, whose name starts with a dot and never is the output's. Where no temporary file can be "
+    "written to a new temporary file in the same directory that nobody else can open (unnamed where the file "
+    "system allows), given its final mode before any byte (the old file's permission bits without set-user-ID "
+    "and set-group-ID, and owner and group where allowed), flushed to disk and renamed over the name; the "
+    "directory is flushed after. Readers of the old file keep a consistent old image; a new open sees the "
+    "complete new one. Any failure, and every signal that ends the process and can be caught, remove the "
+    "temporary file and leave the output as it was. SIGKILL may leave a named temporary file, whose name "
+    "starts with a dot and never is the output's; the next compile of that output removes it. In a sticky, "
+    "world-writable directory (such as /tmp) a symbolic link of another user than the compiling one and the "
+    "directory's owner is not followed, and nothing is given to another user. Where no temporary file can be "
     "created in the directory, or the output is no regular file (a FIFO, a device), the output is written in "
     "place; a failure then removes a regular output file. An output that is the source file itself is "
-    "refused, and so is an existing output that the process may not write.",
+    "refused, and so is an existing output that the process may not write or, in a sticky directory, "
+    "replace.",
 };
 
 } // namespace qecfg_usage

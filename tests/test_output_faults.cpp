@@ -4,6 +4,7 @@
 // output is written in place.
 #include <csignal>
 #include <sys/resource.h>
+#include <sys/wait.h>
 
 #include "output_support.h"
 
@@ -30,16 +31,26 @@ struct failure_case {
 
 TEST_F(OutputFault, EachFailureLeavesTheDirectoryAsItWas) {
     const failure_case cases[] = {
-        {"source error", [](OutputFault &t) { t.write("input.src", BASE_SOURCE + "Bogus\n"); }, "out.cdef", {},
+        {"source error",
+         [](OutputFault &t) { t.write("input.src", BASE_SOURCE + "Bogus\n"); },
+         "out.cdef",
+         {},
          "16: Invalid table name: Bogus\n"},
-        {"file size limit", {}, "out.cdef",
+        {"file size limit",
+         {},
+         "out.cdef",
          [] {
-             struct rlimit rl{4096, 4096};
+             struct rlimit rl {
+                 4096, 4096
+             };
              setrlimit(RLIMIT_FSIZE, &rl);
          },
          "Cannot extend CDB file: File too large\n"},
         {"missing directory", {}, "no/such/dir/out.cdef", {}, "Cannot create CDB file: No such file or directory\n"},
-        {"directory as output", [](OutputFault &t) { fs::create_directory(t.work / "d.cdef"); }, "d.cdef", {},
+        {"directory as output",
+         [](OutputFault &t) { fs::create_directory(t.work / "d.cdef"); },
+         "d.cdef",
+         {},
          "Cannot create CDB file: Is a directory\n"},
         {"read-only directory", [](OutputFault &t) { fs::permissions(t.work, fs::perms(0555)); }, "new.cdef",
          unprivileged, "Cannot create CDB file: Permission denied\n"},
@@ -49,13 +60,21 @@ TEST_F(OutputFault, EachFailureLeavesTheDirectoryAsItWas) {
              fs::permissions(t.work / "out.cdef", fs::perms(0444));
          },
          "out.cdef", unprivileged, "Cannot create CDB file: Permission denied\n"},
-        {"FIFO", [](OutputFault &t) { ASSERT_EQ(mkfifo((t.work / "f.cdef").c_str(), 0600), 0); }, "f.cdef", {},
+        {"FIFO",
+         [](OutputFault &t) { ASSERT_EQ(mkfifo((t.work / "f.cdef").c_str(), 0600), 0); },
+         "f.cdef",
+         {},
          "Cannot map CDB file: Invalid argument\n"},
         {"output is the source", {}, "input.src", {}, "Cannot create CDB file: Output is the source file\n"},
-        {"output links to the source", [](OutputFault &t) { fs::create_symlink("input.src", t.work / "l.cdef"); },
-         "l.cdef", {}, "Cannot create CDB file: Output is the source file\n"},
+        {"output links to the source",
+         [](OutputFault &t) { fs::create_symlink("input.src", t.work / "l.cdef"); },
+         "l.cdef",
+         {},
+         "Cannot create CDB file: Output is the source file\n"},
         {"output is a hard link of the source",
-         [](OutputFault &t) { fs::create_hard_link(t.work / "input.src", t.work / "h.cdef"); }, "h.cdef", {},
+         [](OutputFault &t) { fs::create_hard_link(t.work / "input.src", t.work / "h.cdef"); },
+         "h.cdef",
+         {},
          "Cannot create CDB file: Output is the source file\n"},
     };
     for (const failure_case &c : cases) {
@@ -88,7 +107,9 @@ TEST_F(OutputFault, MemoryExhaustionStopsWithItsErrorNumber) {
         src << "    DefaultValue=" << std::string(200, 'v') << i << "\n";
     src.close();
     e2e::run_result r = qecfg({"input.src", "out.cdef"}, [] {
-        struct rlimit rl{32 << 20, 32 << 20};
+        struct rlimit rl {
+            32 << 20, 32 << 20
+        };
         setrlimit(RLIMIT_AS, &rl);
     });
     EXPECT_EQ(r.status, ENOMEM);
@@ -155,6 +176,131 @@ TEST_F(OutputFault, ReadOnlyDirectoryWritesInPlace) {
     EXPECT_EQ(r.status, 0) << r.err;
     EXPECT_EQ(e2e::read_file(work / "out.cdef"), image);
     EXPECT_EQ(stat_of(work / "out.cdef").st.st_ino, before);
+}
+
+// Every system call of the output phase made to fail in turn (the Nth call
+// of each kind, until there is no Nth call), for a new name, a replaced file
+// and a file replaced through a link, with and without unnamed temporary
+// files: each run leaves the complete new image (a failure after the rename:
+// flushing the directory) or the old state byte for byte, and no other file.
+TEST_F(OutputFault, InjectedFailureOfEachCallLeavesOldOrNewImageAndNoStrayFile) {
+    const std::string image = image_of(e2e::read_file(work / "input.src"));
+    const fs::path hit = work.string() + ".hit";
+    const char *const calls[] = {"openat",    "fstatat", "fstat",           "readlinkat", "faccessat",
+                                 "fchown",    "fchmod",  "posix_fallocate", "mmap",       "munmap",
+                                 "ftruncate", "fsync",   "close",           "linkat",     "renameat"};
+    // (unlinkat only removes a temporary file after another failure.)
+    struct scenario {
+        const char *name, *output;
+        bool old;
+    };
+    const scenario scenarios[] = {{"new name", "out.cdef", false},
+                                  {"replacement", "out.cdef", true},
+                                  {"replacement through a link", "link.cdef", true}};
+    std::set<std::string> reached;
+    for (bool named : {false, true})
+        for (const scenario &sc : scenarios)
+            for (const char *call : calls)
+                for (int n = 1; n < 30; n++) {
+                    SCOPED_TRACE(std::string(sc.name) + (named ? ", named" : ", unnamed") + ": " + call + " #" +
+                                 std::to_string(n));
+                    fs::remove(work / "out.cdef");
+                    fs::remove(work / "link.cdef");
+                    fs::remove(hit);
+                    fs::create_symlink("out.cdef", work / "link.cdef");
+                    if (sc.old) {
+                        write("out.cdef", old_image);
+                        // Another owner, so that carrying it over is a call too.
+                        if (geteuid() == 0) {
+                            ASSERT_EQ(chown((work / "out.cdef").c_str(), OTHER_USER, OTHER_USER), 0);
+                        }
+                    }
+                    e2e::run_result r = qecfg(
+                        {"input.src", sc.output}, {},
+                        injected(std::string(call) + ":" + std::to_string(n) + ":" + std::to_string(EIO), hit, !named));
+                    bool fired = fs::exists(hit);
+                    std::string now = e2e::read_or(work / "out.cdef", "(absent)");
+                    if (r.status == 0) {
+                        EXPECT_EQ(now, image);
+                    } else {
+                        EXPECT_TRUE(fired) << r.err;
+                        EXPECT_EQ(r.status, 1);
+                        EXPECT_EQ(r.err.rfind("Cannot ", 0), 0u) << r.err;
+                        EXPECT_TRUE(now == (sc.old ? old_image : "(absent)") || now == image);
+                    }
+                    std::set<std::string> expected = {"input.src", "link.cdef"};
+                    if (sc.old || r.status == 0 || now == image)
+                        expected.insert("out.cdef");
+                    EXPECT_EQ(entries(work), expected);
+                    EXPECT_TRUE(fs::is_symlink(work / "link.cdef"));
+                    if (!fired)
+                        break;
+                    reached.insert(call);
+                }
+    fs::remove(hit);
+    // Each kind of call was made and failed at least once.
+    for (const char *call : calls)
+        EXPECT_EQ(reached.count(call), 1u) << call;
+}
+
+// Failures that used to pass for success, each with its reason.
+TEST_F(OutputFault, FailingChecksAreFailuresWithTheirReason) {
+    struct checked {
+        std::string fault;
+        std::string err;
+    };
+    const checked cases[] = {
+        {"fstatat:1:" + std::to_string(EIO), "Cannot create CDB file: Input/output error\n"},
+        {"faccessat:1:" + std::to_string(ENOSYS), "Cannot create CDB file: Function not implemented\n"},
+        {"fchown:1:" + std::to_string(EIO), "Cannot create CDB file: Input/output error\n"},
+        // A reservation that reports success but is not there: no fault in
+        // the mapping.
+        {"posix_fallocate:1:0", "Cannot extend CDB file: File shorter than its reserved size\n"},
+    };
+    for (const checked &c : cases) {
+        SCOPED_TRACE(c.fault);
+        write("out.cdef", old_image);
+        if (geteuid() == 0)
+            ASSERT_EQ(chown((work / "out.cdef").c_str(), OTHER_USER, OTHER_USER), 0);
+        else if (c.fault.rfind("fchown", 0) == 0)
+            continue; // nothing to carry over without another owner
+        e2e::run_result r = qecfg({"input.src", "out.cdef"}, {}, injected(c.fault));
+        EXPECT_EQ(r.status, 1);
+        EXPECT_EQ(r.err, c.err);
+        EXPECT_EQ(e2e::read_file(work / "out.cdef"), old_image);
+        EXPECT_EQ(entries(work), (std::set<std::string>{"input.src", "out.cdef"}));
+    }
+}
+
+// A replaced file's mode carries over without its set-user-ID and
+// set-group-ID bits.
+TEST_F(OutputFault, SetIdBitsAreDropped) {
+    write("out.cdef", old_image);
+    ASSERT_EQ(chmod((work / "out.cdef").c_str(), 06755), 0);
+    ASSERT_EQ(qecfg({"input.src", "out.cdef"}).status, 0);
+    EXPECT_EQ(stat_of(work / "out.cdef").st.st_mode & 07777, 0755u);
+}
+
+// Temporary files of this output left by compiles that no longer run (and
+// are this user's) are removed; others stay.
+TEST_F(OutputFault, StaleTemporaryFilesAreRemoved) {
+    pid_t gone = fork();
+    if (gone == 0)
+        _exit(0);
+    waitpid(gone, nullptr, 0);
+    const std::string stale = ".out.cdef.tmp-" + std::to_string(gone) + "-Ab3dEf9hIj0k",
+                      running = ".out.cdef.tmp-" + std::to_string(getpid()) + "-Ab3dEf9hIj0k",
+                      other_output = ".other.cdef.tmp-" + std::to_string(gone) + "-Ab3dEf9hIj0k",
+                      others = ".out.cdef.tmp-" + std::to_string(gone) + "-ZZ3dEf9hIj0k";
+    for (const std::string &name : {stale, running, other_output, others})
+        write(name, "partial");
+    std::set<std::string> kept = {"input.src", "out.cdef", running, other_output};
+    if (geteuid() == 0) {
+        ASSERT_EQ(chown((work / others).c_str(), OTHER_USER, OTHER_USER), 0);
+        kept.insert(others);
+    }
+    ASSERT_EQ(qecfg({"input.src", "out.cdef"}).status, 0);
+    EXPECT_EQ(entries(work), kept);
 }
 
 } // namespace

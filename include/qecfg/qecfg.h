@@ -46,6 +46,10 @@ struct options {
     // other traces on trace_out.
     std::FILE *trace_out = stdout;
     std::FILE *trace_err = stderr;
+    // compile_to_file: leave the flushes of the output file and its directory
+    // to the system (faster, but a power loss may then lose the output or keep
+    // the old one although the compile reported success).
+    bool skip_disk_flush = false;
 };
 
 // Where the source comes from. The bytes of an in-memory source are not
@@ -79,20 +83,27 @@ result compile_to_memory(const source &src, std::vector<std::uint8_t> &image, co
 //
 // An existing regular file (or the file a symbolic link designates) is
 // replaced atomically: the image is written to a new temporary file in the
-// same directory, flushed to disk when it replaces a file, given the old
-// file's permission bits (and owner and group, where allowed) and renamed
-// over the name. Any failure removes the temporary file and leaves the name
-// as it was. An output that is the source file itself is refused, and so is
-// an existing output that the process may not write.
+// same directory that others cannot open (unnamed where the file system
+// allows), given its final mode before any byte (a replaced file's permission
+// bits without set-user-ID and set-group-ID, and its owner and group where
+// allowed), flushed to disk and renamed over the name, and the directory is
+// flushed after. Any failure removes the temporary file and leaves the name
+// as it was. Refused (after the source compiled, so that an error of the
+// source comes first): an output that is the source file
+// itself, an existing output that the process may not write, a symbolic link
+// of another user in a sticky world-writable directory, another user's file
+// in a sticky directory that this process may not replace.
 //
 // Where no temporary file can be created in the directory, or the output is
 // not a regular file (a FIFO, a device), the file is written in place; then a
 // failure removes a regular output file.
 result compile_to_file(const source &src, const std::string &output_path, const options &opt = {});
 
-// For programs that compile to files: makes SIGINT, SIGTERM and SIGHUP
-// remove the temporary file of a compile in progress before they end the
-// process as they would have; ignores SIGXFSZ, so that a file size limit
+// For programs that compile to files: makes every signal that would end the
+// process (SIGINT, SIGTERM, SIGHUP, SIGPIPE, SIGUSR1, ... but not SIGKILL) and
+// that is neither ignored nor handled already remove the temporary file of a
+// compile in progress before it ends the process as it would have; ignores
+// SIGXFSZ, so that a file size limit
 // fails the compile with "Cannot extend CDB file: File too large" instead of
 // killing the process.
 void remove_temporary_files_on_signals();
