@@ -150,7 +150,7 @@ int cdb_check(const cdb_t *db, void *scratch, size_t scratch_size, size_t *bad_o
 
 /* ---- Header and dsects -------------------------------------------------- */
 
-enum cdb_dsect_type { CDB_DSECT_MANAGER = 3, CDB_DSECT_VAR_CLASS = 4, CDB_DSECT_CLASS = 5, CDB_DSECT_MAP = 6 };
+enum cdb_dsect_type { CDB_MANAGER_DSECT = 3, CDB_VAR_CLASS_DSECT = 4, CDB_CLASS_DSECT = 5, CDB_MAP_DSECT = 6 };
 
 typedef struct cdb_header {
     uint32_t length, checksum, seqno, tv_sec, tv_usec, dsect_count;

@@ -326,9 +326,9 @@ static int check_dsects(checker_t *ck, size_t scratch_size) {
             memset(ck->claims, 0, (d.length + 7) / 8);
         }
         switch (d.type) {
-        case CDB_DSECT_CLASS: TRY(class_dsect(ck, i, &d, &max_class_id)); break;
-        case CDB_DSECT_MANAGER: TRY(manager_dsect(ck, &d, &max_rm_id)); break;
-        case CDB_DSECT_MAP: TRY(map_dsect(ck, &d)); break;
+        case CDB_CLASS_DSECT: TRY(class_dsect(ck, i, &d, &max_class_id)); break;
+        case CDB_MANAGER_DSECT: TRY(manager_dsect(ck, &d, &max_rm_id)); break;
+        case CDB_MAP_DSECT: TRY(map_dsect(ck, &d)); break;
         default: TRY(var_class_dsect(ck, &d)); break;
         }
     }

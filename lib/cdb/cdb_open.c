@@ -9,10 +9,10 @@ static const uint16_t record_sizes[NUM_RECORD_SIZES] = {RC_SIZE, RCM_SIZE, RM_SI
  * manager, the map, the variable classes. */
 static int dsect_rank(uint32_t type) {
     switch (type) {
-    case CDB_DSECT_CLASS: return 0;
-    case CDB_DSECT_MANAGER: return 1;
-    case CDB_DSECT_MAP: return 2;
-    case CDB_DSECT_VAR_CLASS: return 3;
+    case CDB_CLASS_DSECT: return 0;
+    case CDB_MANAGER_DSECT: return 1;
+    case CDB_MAP_DSECT: return 2;
+    case CDB_VAR_CLASS_DSECT: return 3;
     default: return -1;
     }
 }
@@ -154,10 +154,10 @@ static const char *unset_string_ref(const cdb_t *db, size_t at, size_t base, siz
 
 int cdb_get_manager(const cdb_t *db, cdb_manager_t *m) {
     cdb_dsect_t d;
-    int i = cdb_find_dsect(db, CDB_DSECT_MANAGER, 0), err;
+    int i = cdb_find_dsect(db, CDB_MANAGER_DSECT, 0), err;
     if (i < 0)
         return i;
-    err = cdb_dsect_record(db, (uint32_t)i, CDB_DSECT_MANAGER, RM_SIZE, ID_MGR, &d);
+    err = cdb_dsect_record(db, (uint32_t)i, CDB_MANAGER_DSECT, RM_SIZE, ID_MGR, &d);
     if (err)
         return err;
     m->id = cdb_rd16(db, d.offset + RM_ID);
@@ -170,10 +170,10 @@ int cdb_get_map(const cdb_t *db, cdb_map_t *m) {
     uint16_t *shorts[8];
     uint32_t *words[4];
     size_t b, k;
-    int i = cdb_find_dsect(db, CDB_DSECT_MAP, 0), err;
+    int i = cdb_find_dsect(db, CDB_MAP_DSECT, 0), err;
     if (i < 0)
         return i;
-    err = cdb_dsect_record(db, (uint32_t)i, CDB_DSECT_MAP, RCM_SIZE, ID_CMMAP, &d);
+    err = cdb_dsect_record(db, (uint32_t)i, CDB_MAP_DSECT, RCM_SIZE, ID_CMMAP, &d);
     if (err)
         return err;
     b = d.offset;
@@ -194,7 +194,7 @@ int cdb_var_class_at(const cdb_t *db, uint32_t i, cdb_var_class_t *vc) {
     cdb_dsect_t d;
     size_t b, room;
     uint32_t strings;
-    int err = cdb_dsect_record(db, i, CDB_DSECT_VAR_CLASS, RVC_SIZE, ID_VAR_CLASS, &d);
+    int err = cdb_dsect_record(db, i, CDB_VAR_CLASS_DSECT, RVC_SIZE, ID_VAR_CLASS, &d);
     if (err)
         return err;
     b = d.offset;
@@ -217,8 +217,8 @@ int cdb_var_class_at(const cdb_t *db, uint32_t i, cdb_var_class_t *vc) {
 
 int cdb_find_var_class(const cdb_t *db, const char *name, cdb_var_class_t *vc) {
     int i;
-    for (i = cdb_find_dsect(db, CDB_DSECT_VAR_CLASS, 0); i >= 0;
-         i = cdb_find_dsect(db, CDB_DSECT_VAR_CLASS, (uint32_t)i + 1))
+    for (i = cdb_find_dsect(db, CDB_VAR_CLASS_DSECT, 0); i >= 0;
+         i = cdb_find_dsect(db, CDB_VAR_CLASS_DSECT, (uint32_t)i + 1))
         if (cdb_var_class_at(db, (uint32_t)i, vc) == CDB_OK && vc->name && strcmp(vc->name, name) == 0)
             return CDB_OK;
     return CDB_ERR_NOTFOUND;
@@ -240,7 +240,7 @@ int cdb_class_at(const cdb_t *db, uint32_t i, cdb_class_t *c) {
     static const uint16_t refs[9] = {24, 32, 40, 48, 96, 104, RC_VARIETIES, RC_SD_DEFS, RC_VALID_VALS};
     cdb_dsect_t d;
     size_t expected = RC_SIZE, t;
-    int err = cdb_dsect_record(db, i, CDB_DSECT_CLASS, RC_SIZE, ID_CLASS, &d);
+    int err = cdb_dsect_record(db, i, CDB_CLASS_DSECT, RC_SIZE, ID_CLASS, &d);
     if (err)
         return err;
     c->db = db;
@@ -291,7 +291,7 @@ uint32_t cdb_class_field(const cdb_class_t *c, int field) {
 static int scan_classes(const cdb_t *db, cdb_class_t *c, int (*match)(const cdb_class_t *, const void *),
                         const void *key) {
     int i;
-    for (i = cdb_find_dsect(db, CDB_DSECT_CLASS, 0); i >= 0; i = cdb_find_dsect(db, CDB_DSECT_CLASS, (uint32_t)i + 1))
+    for (i = cdb_find_dsect(db, CDB_CLASS_DSECT, 0); i >= 0; i = cdb_find_dsect(db, CDB_CLASS_DSECT, (uint32_t)i + 1))
         if (cdb_class_at(db, (uint32_t)i, c) == CDB_OK && match(c, key))
             return CDB_OK;
     return CDB_ERR_NOTFOUND;
@@ -346,7 +346,7 @@ int cdb_index_build(cdb_index_t *ix, const cdb_t *db, void *mem, size_t size) {
     ix->slots = (uint32_t *)mem;
     ix->mask = n - 1;
     memset(mem, 0, cdb_index_size(db));
-    for (i = cdb_find_dsect(db, CDB_DSECT_CLASS, 0); i >= 0; i = cdb_find_dsect(db, CDB_DSECT_CLASS, (uint32_t)i + 1)) {
+    for (i = cdb_find_dsect(db, CDB_CLASS_DSECT, 0); i >= 0; i = cdb_find_dsect(db, CDB_CLASS_DSECT, (uint32_t)i + 1)) {
         const char *name;
         uint16_t id;
         uint32_t *s;

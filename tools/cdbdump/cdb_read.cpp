@@ -77,9 +77,9 @@ class model_reader {
 
     dsect read(uint32_t i, const cdb_dsect_t &d) const {
         switch (d.type) {
-        case CDB_DSECT_CLASS: return read_class(i);
-        case CDB_DSECT_MANAGER: return read_manager();
-        case CDB_DSECT_MAP: return read_map();
+        case CDB_CLASS_DSECT: return read_class(i);
+        case CDB_MANAGER_DSECT: return read_manager();
+        case CDB_MAP_DSECT: return read_map();
         default: return read_var_class(i);
         }
     }
