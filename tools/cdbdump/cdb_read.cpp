@@ -208,12 +208,16 @@ class model_reader {
         std::vector<dattr> *dattrs[] = {&c.dattrs_class, &c.dattrs};
         cdb_attr_t a;
         for (int k = 0; k < 2; k++) {
+            pattrs[k]->reserve(cdb_attr_count(&cls, CDB_PATTR_CLASS + 2 * k));
+            dattrs[k]->reserve(cdb_attr_count(&cls, CDB_DATTR_CLASS + 2 * k));
             for (uint32_t n = 0; cdb_attr_at(&cls, CDB_PATTR_CLASS + 2 * k, n, &a) == CDB_OK; n++)
                 pattrs[k]->push_back(read_pattr(a));
             for (uint32_t n = 0; cdb_attr_at(&cls, CDB_DATTR_CLASS + 2 * k, n, &a) == CDB_OK; n++)
                 dattrs[k]->push_back(read_dattr(a));
         }
         cdb_action_t x;
+        c.actions_class.reserve(cdb_action_count(&cls, 1));
+        c.actions.reserve(cdb_action_count(&cls, 0));
         for (uint32_t n = 0; cdb_action_at(&cls, 1, n, &x) == CDB_OK; n++)
             c.actions_class.push_back(read_action(x));
         for (uint32_t n = 0; cdb_action_at(&cls, 0, n, &x) == CDB_OK; n++)
@@ -262,14 +266,19 @@ class model_reader {
 
 } // namespace
 
-bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+bool library_accepts(const uint8_t *data, size_t size) {
     cdb_t db;
     if (cdb_open(&db, data, size) != CDB_OK)
         return false;
     std::vector<unsigned char> scratch(cdb_check_scratch_size(&db));
-    if (cdb_check(&db, scratch.data(), scratch.size(), nullptr) != CDB_OK)
+    return cdb_check(&db, scratch.data(), scratch.size(), nullptr) == CDB_OK;
+}
+
+bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+    cdb_t db;
+    if (!library_accepts(data, size))
         return false;
-    scratch = {};
+    cdb_open(&db, data, size);
     cdb_header_t h;
     cdb_get_header(&db, &h);
     head.big_endian = db.big_endian != 0;

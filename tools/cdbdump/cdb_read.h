@@ -11,6 +11,9 @@
 
 namespace cdbdump {
 
+// Whether the library's full check (with its overlap map) accepts the image.
+bool library_accepts(const uint8_t *data, size_t size);
+
 // Whether the library's full check accepts the image; when it does, the
 // header and anchors go into `head` and each dsect to `each` (or into
 // head.dsects when `each` is empty).

@@ -15,6 +15,7 @@
 #include "cdb_sink.h"
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
+#include "cdb_read.h"
 #include "cdb_walk.h"
 
 using namespace cdbdump;
@@ -120,6 +121,7 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
             for (const std::string &w : d.warnings) std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
             return 0;
         }
+        if (m == mode::check && library_accepts(in.data(), in.size())) return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
         if (m != mode::check)
             write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
