@@ -184,6 +184,14 @@ class database {
         if (err)
             throw error(err, bad);
     }
+    uint32_t dsect_count() const { return db_.dsect_count; }
+    // The class of dsect i, filled into `out`; false when dsect i is no class.
+    bool class_at(uint32_t i, std::optional<resource_class> &out) const {
+        cdb_class_t c;
+        if (cdb_class_at(&db_, i, &c) != CDB_OK) return false;
+        out.emplace(c);
+        return true;
+    }
     // The class of that name or id, filled into `out` (which its views point at).
     bool find_class(const std::string &name, std::optional<resource_class> &out) const {
         cdb_class_t c;

@@ -11,6 +11,7 @@
 
 #include "cdb_annotate.h"
 #include "cdb_diff.h"
+#include "cdb_header.h"
 #include "cdb_input.h"
 #include "cdb_sink.h"
 #include "cdb_source.h"
@@ -21,14 +22,14 @@
 using namespace cdbdump;
 
 namespace {
-const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
+const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source | --header] [-h|--help] [--version] FILE\n"
                           "       cdbdump --diff | --compat [--json] OLD NEW\n";
 
 const char help_text[] = "NAME\n"
                          "    cdbdump - inspect, verify and decompile a class definition database (CDB)\n"
                          "\n"
                          "SYNOPSIS\n"
-                         "    cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
+                         "    cdbdump [--check | --json | --annotate | --source | --header] [-h|--help] [--version] FILE\n"
                          "    cdbdump --diff | --compat [--json] OLD NEW\n"
                          "\n"
                          "DESCRIPTION\n"
@@ -49,6 +50,8 @@ const char help_text[] = "NAME\n"
                          "    --source     print a class definition source that the compiler turns\n"
                          "                 back into a CDB of the same content; what no source can\n"
                          "                 say is reported as a warning and as a comment in place\n"
+                         "    --header     print a C header of the class names, class ids, attribute\n"
+                         "                 and action ids as constants\n"
                          "    --diff       print the content differences of the CDBs OLD and NEW,\n"
                          "                 keyed by names; layout, timestamp and byte order ignored\n"
                          "    --compat     print the differences with the verdict of each: breaking\n"
@@ -64,7 +67,7 @@ const char help_text[] = "NAME\n"
                          "    2  a usage error, FILE cannot be read, the output cannot be written,\n"
                          "       or memory is exhausted\n";
 
-enum class mode { text, check, json, annotate, source, diff, compat };
+enum class mode { text, check, json, annotate, source, header, diff, compat };
 
 struct command {
     mode m = mode::text;
@@ -123,6 +126,10 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
         }
         if (m == mode::check && library_accepts(in.data(), in.size())) return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
+        if (m == mode::header) {
+            write_c_header(in.data(), in.size(), name, out);
+            return 0;
+        }
         if (m != mode::check)
             write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
     } catch (const cdb_invalid &e) {
@@ -156,6 +163,7 @@ int compare(const command &c, text_sink &out, FILE *err) {
 std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE *err) {
     const std::pair<const char *, mode> modes[] = {{"--check", mode::check},   {"--json", mode::json},
                                                    {"--annotate", mode::annotate}, {"--source", mode::source},
+                                                   {"--header", mode::header},
                                                    {"--diff", mode::diff},     {"--compat", mode::compat}};
     bool mode_given = false, options_done = false;
     for (int i = 1; i < argc; i++) {
@@ -186,7 +194,7 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
             continue;
         }
         if (mode_given)
-            return usage_error(err, "only one of --check, --json, --annotate, --source, --diff and --compat "
+            return usage_error(err, "only one of --check, --json, --annotate, --source, --header, --diff and --compat "
                                     "(--json may go with --diff or --compat)");
         c.m = mm;
         mode_given = true;
