@@ -69,7 +69,7 @@ TEST(Cli, UsageErrorsExitWithTwo) {
         EXPECT_NE(r.err.find(message), std::string::npos) << r.err;
         EXPECT_TRUE(r.out.empty());
     }
-    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source]"), std::string::npos);
+    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source | --header]"), std::string::npos);
 }
 
 TEST(Cli, HelpAndVersion) {
