@@ -3,8 +3,8 @@
 example and the generated sources of compare_builds.py, compiled plainly and
 with -s, and mutated copies of those images (a byte changed, with and without
 the checksum made right again, or the file cut short). Every mode (text,
---check, --json, --annotate, --source) runs on every image, and --diff,
---compat and --compat --json on neighbouring pairs; the exit status, standard
+--check, --json, --annotate, --source) runs on every image, and --diff
+and --compat on neighbouring pairs; the exit status, standard
 output and standard error must agree.
 
     bench/compare_cdbdump.py QECFG OLD_CDBDUMP NEW_CDBDUMP [--generated N] [--mutations M]
@@ -27,7 +27,9 @@ builds = importlib.util.module_from_spec(spec)
 spec.loader.exec_module(builds)
 
 SINGLE = ([], ["--check"], ["--json"], ["--annotate"], ["--source"])
-PAIRS = (["--diff"], ["--compat"], ["--compat", "--json"])
+# --diff --json and --compat --json are left out: their path parts are
+# structured now, a deliberate change of their output.
+PAIRS = (["--diff"], ["--compat"])
 
 
 def compile_all(qecfg, items, out_dir):
