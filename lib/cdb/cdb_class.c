@@ -60,22 +60,35 @@ int cdb_attr_at(const cdb_class_t *c, int kind, uint32_t i, cdb_attr_t *a) {
     return record_at(c, kind, attr_size(kind), i, attr_ids[kind], &a->rec);
 }
 
-int cdb_find_attr(const cdb_class_t *c, int kind, int32_t id, cdb_attr_t *a) {
-    uint32_t i, n = cdb_attr_count(c, kind);
-    for (i = 0; i < n; i++)
-        if (cdb_attr_at(c, kind, i, a) == CDB_OK && cdb_attr_id(a) == id)
-            return CDB_OK;
-    return CDB_ERR_NOTFOUND;
-}
-
-int cdb_find_attr_by_name(const cdb_class_t *c, int kind, const char *name, cdb_attr_t *a) {
-    uint32_t i, n = cdb_attr_count(c, kind);
+/* The first record of table t whose id word at id_at is id or, when name is
+ * not NULL, whose name at name_at is name. */
+static int find_record(const cdb_class_t *c, int t, size_t size, uint32_t ident, size_t id_at, int32_t id,
+                       size_t name_at, const char *name, uint32_t *rec) {
+    uint32_t i, n = (uint32_t)(c->tables[t][1] / size);
     for (i = 0; i < n; i++) {
         const char *s;
-        if (cdb_attr_at(c, kind, i, a) == CDB_OK && (s = cdb_attr_name(a)) && strcmp(s, name) == 0)
+        if (record_at(c, t, size, i, ident, rec) != CDB_OK)
+            continue;
+        if (name ? (s = string_ref(c, *rec + name_at)) != NULL && strcmp(s, name) == 0
+                 : (int32_t)cdb_rd32(c->db, *rec + id_at) == id)
             return CDB_OK;
     }
     return CDB_ERR_NOTFOUND;
+}
+
+static int find_attr(const cdb_class_t *c, int kind, int32_t id, const char *name, cdb_attr_t *a) {
+    if (kind < 0 || kind > 3)
+        return CDB_ERR_BADARG;
+    a->cls = c;
+    a->kind = kind;
+    return find_record(c, kind, attr_size(kind), attr_ids[kind], is_dattr(kind) ? DA_ATTR_ID : PA_ATTR_ID, id, RA_NAME,
+                       name, &a->rec);
+}
+
+int cdb_find_attr(const cdb_class_t *c, int kind, int32_t id, cdb_attr_t *a) { return find_attr(c, kind, id, NULL, a); }
+
+int cdb_find_attr_by_name(const cdb_class_t *c, int kind, const char *name, cdb_attr_t *a) {
+    return find_attr(c, kind, 0, name, a);
 }
 
 const char *cdb_attr_name(const cdb_attr_t *a) { return string_ref(a->cls, a->rec + RA_NAME); }
@@ -277,22 +290,19 @@ int cdb_action_at(const cdb_class_t *c, int of_class, uint32_t i, cdb_action_t *
                      &x->rec);
 }
 
+static int find_action(const cdb_class_t *c, int of_class, int32_t id, const char *name, cdb_action_t *x) {
+    x->cls = c;
+    x->of_class = of_class != 0;
+    return find_record(c, of_class ? T_ACTIONS_C : T_ACTIONS, AC_SIZE, of_class ? ID_ACTION_CLASS : ID_ACTION, AC_ID,
+                       id, AC_NAME, name, &x->rec);
+}
+
 int cdb_find_action(const cdb_class_t *c, int of_class, int32_t id, cdb_action_t *x) {
-    uint32_t i, n = cdb_action_count(c, of_class);
-    for (i = 0; i < n; i++)
-        if (cdb_action_at(c, of_class, i, x) == CDB_OK && cdb_action_id(x) == id)
-            return CDB_OK;
-    return CDB_ERR_NOTFOUND;
+    return find_action(c, of_class, id, NULL, x);
 }
 
 int cdb_find_action_by_name(const cdb_class_t *c, int of_class, const char *name, cdb_action_t *x) {
-    uint32_t i, n = cdb_action_count(c, of_class);
-    for (i = 0; i < n; i++) {
-        const char *s;
-        if (cdb_action_at(c, of_class, i, x) == CDB_OK && (s = cdb_action_name(x)) && strcmp(s, name) == 0)
-            return CDB_OK;
-    }
-    return CDB_ERR_NOTFOUND;
+    return find_action(c, of_class, 0, name, x);
 }
 
 const char *cdb_action_name(const cdb_action_t *x) { return string_ref(x->cls, x->rec + AC_NAME); }

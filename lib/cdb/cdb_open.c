@@ -152,12 +152,15 @@ static const char *unset_string_ref(const cdb_t *db, size_t at, size_t base, siz
     return len == 0 && cdb_rd32(db, at) == 0 ? NULL : string_ref(db, at, base, len);
 }
 
+/* The first dsect of a type the file has one of, with its record. */
+static int only_dsect(const cdb_t *db, uint32_t type, uint32_t size, uint32_t id, cdb_dsect_t *d) {
+    int i = cdb_find_dsect(db, type, 0);
+    return i < 0 ? i : cdb_dsect_record(db, (uint32_t)i, type, size, id, d);
+}
+
 int cdb_get_manager(const cdb_t *db, cdb_manager_t *m) {
     cdb_dsect_t d;
-    int i = cdb_find_dsect(db, CDB_MANAGER_DSECT, 0), err;
-    if (i < 0)
-        return i;
-    err = cdb_dsect_record(db, (uint32_t)i, CDB_MANAGER_DSECT, RM_SIZE, ID_MGR, &d);
+    int err = only_dsect(db, CDB_MANAGER_DSECT, RM_SIZE, ID_MGR, &d);
     if (err)
         return err;
     m->id = cdb_rd16(db, d.offset + RM_ID);
@@ -170,10 +173,7 @@ int cdb_get_map(const cdb_t *db, cdb_map_t *m) {
     uint16_t *shorts[8];
     uint32_t *words[4];
     size_t b, k;
-    int i = cdb_find_dsect(db, CDB_MAP_DSECT, 0), err;
-    if (i < 0)
-        return i;
-    err = cdb_dsect_record(db, (uint32_t)i, CDB_MAP_DSECT, RCM_SIZE, ID_CMMAP, &d);
+    int err = only_dsect(db, CDB_MAP_DSECT, RCM_SIZE, ID_CMMAP, &d);
     if (err)
         return err;
     b = d.offset;

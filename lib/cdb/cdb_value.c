@@ -61,54 +61,56 @@ int cdb_value_double(const cdb_value_t *v, double *out) {
     return CDB_OK;
 }
 
-int cdb_value_int64(const cdb_value_t *v, int64_t *out) {
+/* A number as its sign and magnitude; a float truncated toward zero, and
+ * CDB_ERR_KIND when it is not finite or 2^64 or more in magnitude. */
+static int sign_and_magnitude(const cdb_value_t *v, int *negative, uint64_t *magnitude) {
     uint64_t bits;
     double d;
     int err = cdb_value_bits(v, &bits);
     if (err)
         return err;
     switch (v->type) {
-    case CDB_INT32: *out = (int32_t)(uint32_t)bits; return CDB_OK;
-    case CDB_UINT32: *out = (uint32_t)bits; return CDB_OK;
-    case CDB_INT64: *out = (int64_t)bits; return CDB_OK;
-    case CDB_UINT64:
-        if (bits > INT64_MAX)
-            return CDB_ERR_KIND;
-        *out = (int64_t)bits;
+    case CDB_UINT32:
+    case CDB_UINT64: *negative = 0, *magnitude = bits; return CDB_OK;
+    case CDB_INT32:
+    case CDB_INT64: {
+        int64_t s = v->type == CDB_INT32 ? (int32_t)(uint32_t)bits : (int64_t)bits;
+        *negative = s < 0;
+        *magnitude = s < 0 ? 0 - (uint64_t)s : (uint64_t)s;
         return CDB_OK;
+    }
     default:
         cdb_value_double(v, &d);
-        if (!(d >= -9223372036854775808.0 && d < 9223372036854775808.0))
+        if (!(fabs(d) < 18446744073709551616.0))
             return CDB_ERR_KIND;
-        *out = (int64_t)d;
+        *negative = d < 0;
+        *magnitude = (uint64_t)fabs(d);
         return CDB_OK;
     }
 }
 
-int cdb_value_uint64(const cdb_value_t *v, uint64_t *out) {
-    uint64_t bits;
-    double d;
-    int err = cdb_value_bits(v, &bits);
+int cdb_value_int64(const cdb_value_t *v, int64_t *out) {
+    int negative;
+    uint64_t m;
+    int err = sign_and_magnitude(v, &negative, &m);
     if (err)
         return err;
-    switch (v->type) {
-    case CDB_INT32:
-    case CDB_INT64: {
-        int64_t s = v->type == CDB_INT32 ? (int32_t)(uint32_t)bits : (int64_t)bits;
-        if (s < 0)
-            return CDB_ERR_KIND;
-        *out = (uint64_t)s;
-        return CDB_OK;
-    }
-    case CDB_UINT32:
-    case CDB_UINT64: *out = bits; return CDB_OK;
-    default:
-        cdb_value_double(v, &d);
-        if (!(d >= 0 && d < 18446744073709551616.0))
-            return CDB_ERR_KIND;
-        *out = (uint64_t)d;
-        return CDB_OK;
-    }
+    if (m > (negative ? (uint64_t)INT64_MAX + 1 : (uint64_t)INT64_MAX))
+        return CDB_ERR_KIND;
+    *out = negative && m ? -(int64_t)(m - 1) - 1 : (int64_t)m;
+    return CDB_OK;
+}
+
+int cdb_value_uint64(const cdb_value_t *v, uint64_t *out) {
+    int negative;
+    uint64_t m;
+    int err = sign_and_magnitude(v, &negative, &m);
+    if (err)
+        return err;
+    if (negative && m != 0)
+        return CDB_ERR_KIND;
+    *out = m;
+    return CDB_OK;
 }
 
 int cdb_value_string(const cdb_value_t *v, const char **s, size_t *len) {
