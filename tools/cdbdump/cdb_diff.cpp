@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <map>
+#include <set>
 
+#include "cdb_names.h"
 #include "cdb_text.h"
 #include "cdb_to_tree.h"
 
@@ -141,34 +143,63 @@ std::string dsect_key(const node &d, node &part) {
     return kind + " " + (name->type() == node::kind::null ? "(unnamed)" : c_quote(name->text()));
 }
 
-// The content of a file as one object: the header without its timestamp,
-// then one member per dsect, keyed by dsect_key.
-node content(const cdb_file &f, part_map &parts) {
-    node t = to_tree(f);
-    node header = *t.find("header");
-    header.erase("timestamp");
-    node c = node::object().add("header", header);
-    const std::vector<node> &dsects = t.find("dsects")->items();
+// A file's dsects under their keys (dsect_key, made unique); each dsect is
+// made into its tree only when it is compared, so that the trees of one pair
+// are held at a time.
+struct keyed_dsects {
+    const cdb_file &f;
     std::vector<std::string> keys;
-    std::vector<node> given;
-    for (const node &d : dsects) {
-        node part = node::null();
-        keys.push_back(dsect_key(d, part));
-        given.push_back(std::move(part));
+
+    keyed_dsects(const cdb_file &file, part_map &parts) : f(file) {
+        std::vector<node> given;
+        for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) {
+            node part = node::null(), key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
+            if (auto *c = std::get_if<class_dsect>(&f.dsects[i])) key.add("name", node::string(c->name));
+            if (auto *v = std::get_if<var_class_dsect>(&f.dsects[i]))
+                key.add("name", v->name ? node::string(*v->name) : node::null())
+                    .add("alias", v->alias ? node::string(*v->alias) : node::null());
+            keys.push_back(dsect_key(key, part));
+            given.push_back(std::move(part));
+        }
+        keys = unique(keys, given, parts);
     }
-    keys = unique(keys, given, parts);
-    for (size_t i = 0; i < dsects.size(); i++) {
-        node body = dsects[i];
-        body.erase("dsect");
-        c.add(keys[i], body);
+    // The dsect's content: its tree without its kind, which the key holds.
+    node body(size_t i) const {
+        node b = dsect_node(f.dsects[i], f.anchors[i]);
+        b.erase("dsect");
+        return b;
     }
-    return c;
+    // The header without its timestamp.
+    node header() const {
+        node h = *file_head(f).find("header");
+        h.erase("timestamp");
+        return h;
+    }
+};
+
+// The two files compared as objects of the header and one member per dsect
+// (as differ::objects compares objects), one pair of dsects at a time.
+void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b) {
+    d.compare(a.header(), b.header(), {"header"}, "header");
+    std::map<std::string, size_t> in_b;
+    for (size_t i = 0; i < b.keys.size(); i++) in_b.emplace(b.keys[i], i);
+    std::set<std::string> in_a(a.keys.begin(), a.keys.end());
+    for (size_t i = 0; i < a.keys.size(); i++) {
+        auto found = in_b.find(a.keys[i]);
+        if (found != in_b.end())
+            d.compare(a.body(i), b.body(found->second), {a.keys[i]}, a.keys[i]);
+        else
+            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, a.body(i), node::null(), false, ""});
+    }
+    for (size_t i = 0; i < b.keys.size(); i++)
+        if (!in_a.count(b.keys[i]))
+            d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), b.body(i), false, ""});
 }
 } // namespace
 
 std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file) {
     differ d;
-    d.objects(content(old_file, d.parts), content(new_file, d.parts), {});
+    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts));
     // The first segment names a dsect (or is the header), a quoted one an item;
     // any other is a member's key.
     for (change &c : d.changes)
