@@ -135,4 +135,10 @@ TEST(Source, ChoiceOfAVariableClassIsSaid) {
     EXPECT_EQ(d.text.find("\tVariableClass=VC1\n", at), d.text.find('\n', at) + 1);
     EXPECT_EQ(d.text.find(note, at + 1), std::string::npos);
     EXPECT_EQ(decompile_image(cdbtest::rich_image(false)).text.find("cannot say which class"), std::string::npos);
+    // Each class's attribute gets one of the ID's two places: nothing was chosen.
+    d = decompile_image(cdbtest::image({a, b}, "Test.RM", {{"VC1", std::nullopt, {1, 1}}}));
+    EXPECT_EQ(d.text.find("cannot say which class"), std::string::npos) << d.text;
+    // Two variable classes hold the ID: which class's attribute named which is a choice.
+    d = decompile_image(cdbtest::image({a, b}, "Test.RM", {{"VC1", std::nullopt, {1}}, {"VC2", std::nullopt, {1}}}));
+    EXPECT_NE(d.text.find("variable ID 1 of variable class \"VC2\""), std::string::npos) << d.text;
 }

@@ -4,6 +4,7 @@
 // supplied), it writes statements that give the same content.
 #include <algorithm>
 #include <map>
+#include <set>
 
 #include "cdb_format.h"
 #include "qecfg_language.h"
@@ -384,10 +385,21 @@ void decompiler::assign_variable_classes() {
             for (const dattr &a : c->dattrs_class) classes_of[uint32_t(a.id) | CDB_CLASS_VAR_ID_BIT].push_back(c->name);
             for (const dattr &a : c->dattrs) classes_of[uint32_t(a.id)].push_back(c->name);
         }
+    // How often each ID stands in the variable classes, and in how many.
+    std::map<uint32_t, size_t> occurrences;
+    std::map<uint32_t, std::set<const var_class_dsect *>> holders;
+    for (const cursor &c : vcs)
+        for (uint32_t id : c.v->var_ids) {
+            occurrences[id]++;
+            holders[id].insert(c.v);
+        }
+    // A choice, when attributes of several classes have the ID and either
+    // several variable classes hold it or it stands fewer times than they are.
     auto note_choice = [&](const dattr &a, uint32_t id, const std::string &vclass) {
         std::vector<std::string> names = classes_of[id];
+        bool too_few = names.size() > occurrences[id];
         names.erase(std::unique(names.begin(), names.end()), names.end());
-        if (names.size() < 2) return;
+        if (names.size() < 2 || (holders[id].size() < 2 && !too_few)) return;
         std::string list;
         for (const std::string &name : names) list += (list.empty() ? "" : ", ") + c_quote(name);
         vclass_choice_[&a] = "cdbdump: variable ID " + n(id) + " of variable class " + c_quote(vclass) +
