@@ -69,7 +69,7 @@ TEST(Cli, UsageErrorsExitWithTwo) {
         EXPECT_NE(r.err.find(message), std::string::npos) << r.err;
         EXPECT_TRUE(r.out.empty());
     }
-    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source]"), std::string::npos);
+    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source | --header]"), std::string::npos);
 }
 
 TEST(Cli, HelpAndVersion) {
@@ -104,4 +104,39 @@ TEST(Cli, ReadsStandardInput) {
     EXPECT_EQ(run_binary("--check - < " + good.path), 0);
     EXPECT_EQ(run_binary("--check - < " + bad.path), 1);
     EXPECT_EQ(run_binary("--check"), 2);
+}
+
+// The header names every identifier of the image by its source name; a C
+// compiler checks the values against those the image was written with.
+TEST(Cli, HeaderDefinesTheIdentifiersForC) {
+    temp_file f(cdbtest::rich_image(true), "_cdbdump_rich.cdef");
+    cli_result r = cli({"--header", f.path});
+    ASSERT_EQ(r.status, 0) << r.err;
+    EXPECT_NE(r.out.find("#define RICH_CLASS_CLASS_NAME \"Rich.Class\"\n"), std::string::npos) << r.out;
+    temp_file header(std::vector<uint8_t>(r.out.begin(), r.out.end()), "_rich_cdb.h");
+    std::string check = header.path + ".c";
+    std::ofstream(check) << "#include \"" << header.path << "\"\n"
+                         << "typedef char level[RICH_CLASS_PATTR_LEVEL == 2 ? 1 : -1];\n"
+                         << "typedef char vendor[RICH_CLASS_PATTR_CLASS_VENDOR == 1 ? 1 : -1];\n"
+                         << "typedef char load[RICH_CLASS_DATTR_LOAD == 5 ? 1 : -1];\n"
+                         << "typedef char count[RICH_CLASS_DATTR_CLASS_COUNT == 1 ? 1 : -1];\n"
+                         << "typedef char reset[RICH_CLASS_ACTION_RESET == 3 ? 1 : -1];\n"
+                         << "typedef char id[RICH_CLASS_CLASS_ID == 0 ? 1 : -1];\n"
+                         << "#include \"" << header.path << "\"\n"; // the guard keeps a second inclusion harmless
+    int status = std::system(("cc -std=c99 -pedantic -Werror -fsyntax-only " + check).c_str());
+    std::filesystem::remove(check);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(cli({"--header", "--json", f.path}).status, 2);
+}
+
+TEST(Cli, HeaderIdentifiersAreCNames) {
+    cdbtest::test_class c(false, "9lives.Cl-ass");
+    c.pattr(false, "a.b", 1, 2);
+    c.pattr(false, "A_B", 2, 2); // the same C name: left out with a comment
+    temp_file f(cdbtest::image({c}));
+    cli_result r = cli({"--header", f.path});
+    ASSERT_EQ(r.status, 0) << r.err;
+    EXPECT_NE(r.out.find("#define _9LIVES_CL_ASS_PATTR_A_B 1\n"), std::string::npos) << r.out;
+    EXPECT_NE(r.out.find("/* attribute: _9LIVES_CL_ASS_PATTR_A_B is already defined above */"), std::string::npos);
+    EXPECT_EQ(cli({"--header", temp_file(corrupt_image()).path}).status, 1);
 }

@@ -118,3 +118,27 @@ TEST(Source, SaysWhatNoSourceCanGive) {
     EXPECT_FALSE(has(d.text, "\tName=out/name"));
     EXPECT_TRUE(has(d.text, "# cdbdump: \"Act\": permission 0x3"));
 }
+
+// Two classes' dynamic attributes of one id, and one variable class holding
+// that id once: the IDs cannot say which class named it. The choice is said
+// in a comment where it is made, and nowhere when the IDs decide.
+TEST(Source, ChoiceOfAVariableClassIsSaid) {
+    cdbtest::test_class a(false, "A.Class"), b(false, "B.Class");
+    a.dattr(false, "Load", 1, 2);
+    b.dattr(false, "Load", 1, 2);
+    decompiled d = decompile_image(cdbtest::image({a, b}, "Test.RM", {{"VC1", std::nullopt, {1}}}));
+    const std::string note = "# cdbdump: variable ID 1 of variable class \"VC1\" is that of dynamic attributes of the "
+                             "classes \"A.Class\", \"B.Class\"; the IDs cannot say which class named it";
+    size_t at = d.text.find(note);
+    ASSERT_NE(at, std::string::npos) << d.text;
+    EXPECT_LT(at, d.text.find("B.Class")); // in A.Class's attribute, which the compiler met first
+    EXPECT_EQ(d.text.find("\tVariableClass=VC1\n", at), d.text.find('\n', at) + 1);
+    EXPECT_EQ(d.text.find(note, at + 1), std::string::npos);
+    EXPECT_EQ(decompile_image(cdbtest::rich_image(false)).text.find("cannot say which class"), std::string::npos);
+    // Each class's attribute gets one of the ID's two places: nothing was chosen.
+    d = decompile_image(cdbtest::image({a, b}, "Test.RM", {{"VC1", std::nullopt, {1, 1}}}));
+    EXPECT_EQ(d.text.find("cannot say which class"), std::string::npos) << d.text;
+    // Two variable classes hold the ID: which class's attribute named which is a choice.
+    d = decompile_image(cdbtest::image({a, b}, "Test.RM", {{"VC1", std::nullopt, {1}}, {"VC2", std::nullopt, {1}}}));
+    EXPECT_NE(d.text.find("variable ID 1 of variable class \"VC2\""), std::string::npos) << d.text;
+}

@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <map>
+#include <set>
 
+#include "cdb_names.h"
 #include "cdb_text.h"
 #include "cdb_to_tree.h"
 
@@ -24,19 +26,34 @@ std::string raw_name(const node &item) {
     return name ? name->text() : "";
 }
 
-// Keys made unique by their occurrence: a second "A" is "A" #2.
-std::vector<std::string> unique(std::vector<std::string> keys) {
+// The structured form of each path segment that names a dsect or an item,
+// by its text, for the JSON output.
+using part_map = std::map<std::string, node>;
+
+// Keys made unique by their occurrence: a second "A" is "A" #2. Each key's
+// part (the given one, with the occurrence from the second on) goes to parts.
+std::vector<std::string> unique(std::vector<std::string> keys, const std::vector<node> &given, part_map &parts) {
     std::map<std::string, int> seen;
-    for (std::string &k : keys)
-        if (int n = ++seen[k]; n > 1) k += " #" + std::to_string(n);
+    for (size_t i = 0; i < keys.size(); i++) {
+        node part = given[i];
+        if (int n = ++seen[keys[i]]; n > 1) {
+            keys[i] += " #" + std::to_string(n);
+            part.add("occurrence", node::uinteger(unsigned(n)));
+        }
+        parts.emplace(keys[i], std::move(part));
+    }
     return keys;
 }
 
 // The named items of a list as path segments: quoted names, made unique.
-std::vector<std::string> item_keys(const node &list) {
+std::vector<std::string> item_keys(const node &list, part_map &parts) {
     std::vector<std::string> keys;
-    for (const node &i : list.items()) keys.push_back(c_quote(raw_name(i)));
-    return unique(keys);
+    std::vector<node> given;
+    for (const node &i : list.items()) {
+        keys.push_back(c_quote(raw_name(i)));
+        given.push_back(node::object().add("name", node::string(raw_name(i))));
+    }
+    return unique(keys, given, parts);
 }
 
 // Lists of named records: compared by name. The order of a structured-data
@@ -64,6 +81,7 @@ path_t with(path_t p, std::string segment) {
 class differ {
   public:
     std::vector<change> changes;
+    part_map parts;
 
     void compare(const node &a, const node &b, const path_t &path, const std::string &key) {
         if (a.type() == node::kind::object && b.type() == node::kind::object) return objects(a, b, path);
@@ -86,7 +104,7 @@ class differ {
 
     // Named items matched by name; path ends with the list's key.
     void lists(const node &a, const node &b, const path_t &path, bool ordered) {
-        std::vector<std::string> keys_a = item_keys(a), keys_b = item_keys(b);
+        std::vector<std::string> keys_a = item_keys(a, parts), keys_b = item_keys(b, parts);
         std::map<std::string, size_t> in_a, in_b;
         for (size_t i = 0; i < keys_a.size(); i++) in_a[keys_a[i]] = i;
         for (size_t i = 0; i < keys_b.size(); i++) in_b[keys_b[i]] = i;
@@ -113,38 +131,82 @@ class differ {
     }
 };
 
-// The dsect's key: its kind, and the name of a class or variable class.
-std::string dsect_key(const node &d) {
+// The dsect's key: its kind, and the name of a class or variable class; and
+// the same as a part: {"dsect": kind, "name": name or null}.
+std::string dsect_key(const node &d, node &part) {
     std::string kind = member(d, "dsect")->text();
     const node *name = member(d, "name");
     if (kind == "variable_class" && name->type() == node::kind::null) name = member(d, "alias");
+    part = node::object().add("dsect", node::string(kind));
     if (kind == "manager" || kind == "map" || !name) return kind;
+    part.add("name", name->type() == node::kind::null ? node::null() : node::string(name->text()));
     return kind + " " + (name->type() == node::kind::null ? "(unnamed)" : c_quote(name->text()));
 }
 
-// The content of a file as one object: the header without its timestamp,
-// then one member per dsect, keyed by dsect_key.
-node content(const cdb_file &f) {
-    node t = to_tree(f);
-    node header = *t.find("header");
-    header.erase("timestamp");
-    node c = node::object().add("header", header);
-    const std::vector<node> &dsects = t.find("dsects")->items();
+// A file's dsects under their keys (dsect_key, made unique); each dsect is
+// made into its tree only when it is compared, so that the trees of one pair
+// are held at a time.
+struct keyed_dsects {
+    const cdb_file &f;
     std::vector<std::string> keys;
-    for (const node &d : dsects) keys.push_back(dsect_key(d));
-    keys = unique(keys);
-    for (size_t i = 0; i < dsects.size(); i++) {
-        node body = dsects[i];
-        body.erase("dsect");
-        c.add(keys[i], body);
+
+    keyed_dsects(const cdb_file &file, part_map &parts) : f(file) {
+        std::vector<node> given;
+        for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) {
+            node part = node::null(), key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
+            if (auto *c = std::get_if<class_dsect>(&f.dsects[i])) key.add("name", node::string(c->name));
+            if (auto *v = std::get_if<var_class_dsect>(&f.dsects[i]))
+                key.add("name", v->name ? node::string(*v->name) : node::null())
+                    .add("alias", v->alias ? node::string(*v->alias) : node::null());
+            keys.push_back(dsect_key(key, part));
+            given.push_back(std::move(part));
+        }
+        keys = unique(keys, given, parts);
     }
-    return c;
+    // The dsect's content: its tree without its kind, which the key holds.
+    node body(size_t i) const {
+        node b = dsect_node(f.dsects[i], f.anchors[i]);
+        b.erase("dsect");
+        return b;
+    }
+    // The header without its timestamp.
+    node header() const {
+        node h = *file_head(f).find("header");
+        h.erase("timestamp");
+        return h;
+    }
+};
+
+// The two files compared as objects of the header and one member per dsect
+// (as differ::objects compares objects), one pair of dsects at a time.
+void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b) {
+    d.compare(a.header(), b.header(), {"header"}, "header");
+    std::map<std::string, size_t> in_b;
+    for (size_t i = 0; i < b.keys.size(); i++) in_b.emplace(b.keys[i], i);
+    std::set<std::string> in_a(a.keys.begin(), a.keys.end());
+    for (size_t i = 0; i < a.keys.size(); i++) {
+        auto found = in_b.find(a.keys[i]);
+        if (found != in_b.end())
+            d.compare(a.body(i), b.body(found->second), {a.keys[i]}, a.keys[i]);
+        else
+            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, a.body(i), node::null(), false, ""});
+    }
+    for (size_t i = 0; i < b.keys.size(); i++)
+        if (!in_a.count(b.keys[i]))
+            d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), b.body(i), false, ""});
 }
 } // namespace
 
 std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file) {
     differ d;
-    d.objects(content(old_file), content(new_file), {});
+    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts));
+    // The first segment names a dsect (or is the header), a quoted one an item;
+    // any other is a member's key.
+    for (change &c : d.changes)
+        for (size_t i = 0; i < c.path.size(); i++) {
+            auto part = i == 0 || c.path[i][0] == '"' ? d.parts.find(c.path[i]) : d.parts.end();
+            c.parts.push_back(part == d.parts.end() ? node::string(c.path[i]) : part->second);
+        }
     return d.changes;
 }
 
@@ -280,7 +342,7 @@ std::string change_line(const change &c, bool compat) {
 
 node change_node(const change &c, bool compat) {
     node path = node::array();
-    for (const std::string &segment : c.path) path.push(node::string(segment));
+    for (const node &part : c.parts) path.push(part);
     node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
     n.add("old", c.before).add("new", c.after);
     if (compat) n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));

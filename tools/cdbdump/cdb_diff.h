@@ -22,6 +22,10 @@ struct change {
     node before = node::null(), after = node::null();
     bool breaking = false;
     std::string reason; // why it breaks, or what kind of compatible change it is
+    // The path for JSON: a dsect as {"dsect": kind, "name": name}, an item as
+    // {"name": name}, each with "occurrence" from the second of one name on;
+    // a member's key as a string.
+    std::vector<node> parts = {};
 };
 
 // The differences in a stable order: the old file's order, additions after.

@@ -129,6 +129,7 @@ struct anchor {
 
 // The record sizes of the header, in header order.
 constexpr int NUM_RECORD_SIZES = 9;
+extern const uint16_t record_sizes[NUM_RECORD_SIZES];
 
 struct cdb_file {
     bool big_endian = false;

@@ -4,6 +4,7 @@
 // supplied), it writes statements that give the same content.
 #include <algorithm>
 #include <map>
+#include <set>
 
 #include "cdb_format.h"
 #include "qecfg_language.h"
@@ -95,6 +96,9 @@ class decompiler {
     const cdb_file &f_;
     writer w_;
     std::map<const dattr *, std::string> vclass_of_;
+    // Why an attribute's variable class was a choice: its variable ID is
+    // also that of a dynamic attribute of another class.
+    std::map<const dattr *, std::string> vclass_choice_;
 };
 
 std::optional<std::string> decompiler::value_text(const value &v, const std::string &what) {
@@ -296,6 +300,8 @@ void decompiler::dattr_stanza(const dattr &d) {
     attr_groups_and_props(d, CDB_DEFAULT_GROUP_ID, dattr_props);
     valid_value_stmts(kw::ValidStateValue, d.vv);
     auto vclass = vclass_of_.find(&d);
+    auto choice = vclass_choice_.find(&d);
+    if (choice != vclass_choice_.end()) w_.comment(choice->second);
     if (vclass != vclass_of_.end()) w_.text(kw::VariableClass, vclass->second);
     value_stmts(kw::InitialValue, d.init, d.name, false);
     if (d.expression) w_.text(kw::Expression, *d.expression);
@@ -372,6 +378,34 @@ void decompiler::assign_variable_classes() {
     std::vector<cursor> vcs;
     for (const dsect &d : f_.dsects)
         if (auto *v = std::get_if<var_class_dsect>(&d)) vcs.push_back(cursor{v});
+    // The classes whose dynamic attributes have each variable ID.
+    std::map<uint32_t, std::vector<std::string>> classes_of;
+    for (const dsect &d : f_.dsects)
+        if (auto *c = std::get_if<class_dsect>(&d)) {
+            for (const dattr &a : c->dattrs_class) classes_of[uint32_t(a.id) | CDB_CLASS_VAR_ID_BIT].push_back(c->name);
+            for (const dattr &a : c->dattrs) classes_of[uint32_t(a.id)].push_back(c->name);
+        }
+    // How often each ID stands in the variable classes, and in how many.
+    std::map<uint32_t, size_t> occurrences;
+    std::map<uint32_t, std::set<const var_class_dsect *>> holders;
+    for (const cursor &c : vcs)
+        for (uint32_t id : c.v->var_ids) {
+            occurrences[id]++;
+            holders[id].insert(c.v);
+        }
+    // A choice, when attributes of several classes have the ID and either
+    // several variable classes hold it or it stands fewer times than they are.
+    auto note_choice = [&](const dattr &a, uint32_t id, const std::string &vclass) {
+        std::vector<std::string> names = classes_of[id];
+        bool too_few = names.size() > occurrences[id];
+        names.erase(std::unique(names.begin(), names.end()), names.end());
+        if (names.size() < 2 || (holders[id].size() < 2 && !too_few)) return;
+        std::string list;
+        for (const std::string &name : names) list += (list.empty() ? "" : ", ") + c_quote(name);
+        vclass_choice_[&a] = "cdbdump: variable ID " + n(id) + " of variable class " + c_quote(vclass) +
+                             " is that of dynamic attributes of the classes " + list +
+                             "; the IDs cannot say which class named it, so the first in order is given it here";
+    };
     auto take = [&](const dattr &a, uint32_t id) {
         for (cursor &c : vcs) {
             if (c.next >= c.v->var_ids.size() || c.v->var_ids[c.next] != id) continue;
@@ -384,6 +418,7 @@ void decompiler::assign_variable_classes() {
                 return;
             }
             vclass_of_[&a] = *c.v->name;
+            note_choice(a, id, *c.v->name);
             return;
         }
     };

@@ -208,6 +208,7 @@ node var_class_node(const var_class_dsect &v) {
 node dsect_head(const anchor &a) {
     return node::object().add("dsect", node::token(dsect_kind_name(a.type))).add("revision", node::uinteger(a.revision));
 }
+} // namespace
 
 node dsect_node(const dsect &d, const anchor &a) {
     node head = dsect_head(a);
@@ -228,6 +229,7 @@ node dsect_node(const dsect &d, const anchor &a) {
     return head;
 }
 
+namespace {
 void add_members(tree_writer &w, const node &object) {
     for (const auto &m : object.members()) w.member(m.first, m.second);
 }
@@ -254,7 +256,6 @@ node value_node(const value &v) {
     return node::null();
 }
 
-namespace {
 node file_head(const cdb_file &f) {
     node sizes = node::object();
     for (int i = 0; i < NUM_RECORD_SIZES; i++) sizes.add(record_size_names[i], node::uinteger(f.record_sizes[i]));
@@ -280,7 +281,6 @@ node file_head(const cdb_file &f) {
         .add("header", header)
         .add("layout", layout);
 }
-} // namespace
 
 node to_tree(const cdb_file &f) {
     node dsects = node::array();

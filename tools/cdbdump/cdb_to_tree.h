@@ -10,6 +10,9 @@
 namespace cdbdump {
 
 node to_tree(const cdb_file &f);
+// The parts of that tree: byte order, header and layout; one dsect.
+node file_head(const cdb_file &f);
+node dsect_node(const dsect &d, const anchor &a);
 node value_node(const value &v);
 
 // The whole document of a verified image, written while a walk reads the

@@ -7,6 +7,7 @@
 
 #include "cdb.h"
 #include "cdb_names.h"
+#include "cdb_read.h"
 #include "cdb_walker.h"
 
 namespace cdbdump {
@@ -23,11 +24,6 @@ const char *const size_fields[NUM_RECORD_SIZES] = {
     "cdb_hdr_rsrc_class_size",          "cdb_hdr_rsrc_cmmap_size", "cdb_hdr_rsrc_mgr_size",
     "cdb_hdr_rsrc_variable_class_size", "cdb_hdr_rsrc_pattr_size", "cdb_hdr_rsrc_dattr_size",
     "cdb_hdr_rsrc_action_size",         "cdb_hdr_rsrc_error_size", "cdb_hdr_rsrc_depend_size",
-};
-const uint16_t record_sizes[NUM_RECORD_SIZES] = {
-    sizeof(rsrc_class_t),          sizeof(rsrc_cmmap_t), sizeof(rsrc_mgr_t),
-    sizeof(rsrc_variable_class_t), sizeof(rsrc_pattr_t), sizeof(rsrc_dattr_t),
-    sizeof(rsrc_action_t),         sizeof(rsrc_error_t), sizeof(rsrc_depend_t),
 };
 
 // Position of a dsect type in the order the file keeps them: classes, the
@@ -48,6 +44,12 @@ std::string id_text(uint32_t id) {
     return s;
 }
 } // namespace
+
+const uint16_t record_sizes[NUM_RECORD_SIZES] = {
+    sizeof(rsrc_class_t),          sizeof(rsrc_cmmap_t), sizeof(rsrc_mgr_t),
+    sizeof(rsrc_variable_class_t), sizeof(rsrc_pattr_t), sizeof(rsrc_dattr_t),
+    sizeof(rsrc_action_t),         sizeof(rsrc_error_t), sizeof(rsrc_depend_t),
+};
 
 // ---------------------------------------------------------------------------
 // Basics
@@ -424,14 +426,15 @@ var_class_dsect walker::walk_var_class(const anchor &a, const std::string &path)
 // ---------------------------------------------------------------------------
 // Entries
 
-cdb_file verify(const uint8_t *data, size_t size) {
-    walker w(data, size, false);
-    return w.run();
-}
+// A file the library's check accepts is read through the library; any other
+// is walked, which finds and names its first violation.
+cdb_file verify(const uint8_t *data, size_t size) { return verify_each(data, size, nullptr); }
 
 cdb_file verify_each(const uint8_t *data, size_t size, const dsect_consumer &each) {
+    cdb_file f;
+    if (read_checked(data, size, f, each)) return f;
     walker w(data, size, false);
-    w.hand_dsects_to(each);
+    if (each) w.hand_dsects_to(each);
     return w.run();
 }
 

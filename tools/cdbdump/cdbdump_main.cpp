@@ -11,20 +11,22 @@
 
 #include "cdb_annotate.h"
 #include "cdb_diff.h"
+#include "cdb_header.h"
 #include "cdb_input.h"
 #include "cdb_sink.h"
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
+#include "cdb_read.h"
 #include "cdb_walk.h"
 #include "cdbdump_usage.h"
 
 using namespace cdbdump;
 
 namespace {
-const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source] [-h|--help] [--version] FILE\n"
+const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source | --header] [-h|--help] [--version] FILE\n"
                           "       cdbdump --diff | --compat [--json] OLD NEW\n";
 
-enum class mode { text, check, json, annotate, source, diff, compat };
+enum class mode { text, check, json, annotate, source, header, diff, compat };
 
 struct command {
     mode m = mode::text;
@@ -81,7 +83,12 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
             for (const std::string &w : d.warnings) std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
             return 0;
         }
+        if (m == mode::check && library_accepts(in.data(), in.size())) return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
+        if (m == mode::header) {
+            write_c_header(in.data(), in.size(), name, out);
+            return 0;
+        }
         if (m != mode::check)
             write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
     } catch (const cdb_invalid &e) {
@@ -115,6 +122,7 @@ int compare(const command &c, text_sink &out, FILE *err) {
 std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE *err) {
     const std::pair<const char *, mode> modes[] = {{"--check", mode::check},   {"--json", mode::json},
                                                    {"--annotate", mode::annotate}, {"--source", mode::source},
+                                                   {"--header", mode::header},
                                                    {"--diff", mode::diff},     {"--compat", mode::compat}};
     bool mode_given = false, options_done = false;
     for (int i = 1; i < argc; i++) {
@@ -145,7 +153,7 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
             continue;
         }
         if (mode_given)
-            return usage_error(err, "only one of --check, --json, --annotate, --source, --diff and --compat "
+            return usage_error(err, "only one of --check, --json, --annotate, --source, --header, --diff and --compat "
                                     "(--json may go with --diff or --compat)");
         c.m = mm;
         mode_given = true;

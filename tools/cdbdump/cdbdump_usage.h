@@ -8,7 +8,7 @@
 namespace cdbdump_usage {
 
 inline constexpr const char *synopsis[] = {
-    "[--check | --json | --annotate | --source] [-h | --help] [--version] {FILE}",
+    "[--check | --json | --annotate | --source | --header] [-h | --help] [--version] {FILE}",
     "--diff | --compat [--json] {OLD} {NEW}",
 };
 
@@ -20,6 +20,8 @@ inline constexpr command_usage::item options[] = {
                    "where it stands (!!) instead of stopping at the first."},
     {"--source", "Print a class definition source that qecfg compiles back into a CDB of the same content; "
                  "what no source can say is reported as a warning and as a comment in place."},
+    {"--header", "Print a C header of the class names, class ids, attribute and action ids as constants, for "
+                 "service code that reads the CDB."},
     {"--diff", "Print the content differences of the CDBs {OLD} and {NEW}, keyed by names, one per line; "
                "layout, timestamp, checksum and byte order are ignored."},
     {"--compat", "Print the same differences, each marked breaking (when {NEW} would break what was stored or "

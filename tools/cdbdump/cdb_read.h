@@ -1,0 +1,24 @@
+// The model of a CDB read through libcdb: after its full check passes, every
+// dsect is read through the library's accessors. A file the check refuses
+// goes to the walker, which names its first violation.
+#ifndef CDBDUMP_CDB_READ_H
+#define CDBDUMP_CDB_READ_H
+
+#include <cstddef>
+#include <cstdint>
+
+#include "cdb_walk.h"
+
+namespace cdbdump {
+
+// Whether the library's full check (with its overlap map) accepts the image.
+bool library_accepts(const uint8_t *data, size_t size);
+
+// Whether the library's full check accepts the image; when it does, the
+// header and anchors go into `head` and each dsect to `each` (or into
+// head.dsects when `each` is empty).
+bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each);
+
+} // namespace cdbdump
+
+#endif
