@@ -1,0 +1,68 @@
+// Variable classes are global to a source; locators and the attributes they
+// name belong to one class, from its ControlDefinition to the next.
+#include "symbols.h"
+
+#include "cursor.h"
+
+namespace lsp {
+
+namespace {
+
+template <typename F> std::vector<const check::statement *> statements_where(const check::source_model &m, F keep) {
+    std::vector<const check::statement *> v;
+    for (const check::stanza &s : m.stanzas)
+        for (const check::statement &st : s.statements)
+            if (!st.skipped && keep(s, st))
+                v.push_back(&st);
+    return v;
+}
+
+} // namespace
+
+std::vector<const check::statement *> variable_class_definitions(const check::source_model &m) {
+    return statements_where(m, [](const check::stanza &s, const check::statement &st) {
+        return s.is("ResourceVariableClass") && st.keyword == "VariableClass";
+    });
+}
+
+std::vector<const check::statement *> variable_class_uses(const check::source_model &m) {
+    return statements_where(m, [](const check::stanza &s, const check::statement &st) {
+        return s.is_dynamic() && st.keyword == "VariableClass";
+    });
+}
+
+std::vector<const check::stanza *> class_holding(const check::source_model &m, int line) {
+    const check::stanza *at = stanza_holding(m, line);
+    std::vector<const check::stanza *> cls;
+    if (!at)
+        return cls;
+    const check::stanza *first = &m.stanzas.front(), *end = first + m.stanzas.size();
+    const check::stanza *start = at;
+    while (start > first && !start->is("ControlDefinition"))
+        start--;
+    if (!start->is("ControlDefinition"))
+        return cls;
+    for (const check::stanza *s = start; s < end && (s == start || !s->is("ControlDefinition")); s++)
+        cls.push_back(s);
+    return cls;
+}
+
+std::vector<const check::statement *> locator_targets(const std::vector<const check::stanza *> &cls) {
+    std::vector<const check::statement *> v;
+    for (const check::stanza *s : cls)
+        if (s->is("PersistentResourceAttribute"))
+            if (const check::statement *name = s->first("Name"))
+                v.push_back(name);
+    return v;
+}
+
+std::vector<const check::statement *> locator_uses(const std::vector<const check::stanza *> &cls) {
+    std::vector<const check::statement *> v;
+    for (const check::stanza *s : cls)
+        if (s->is("ResourceClass"))
+            for (const check::statement *st : s->given("Locator"))
+                v.push_back(st);
+    return v;
+}
+
+} // namespace lsp
