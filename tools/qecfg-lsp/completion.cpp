@@ -42,8 +42,7 @@ json statement_names(const check::stanza &s, int line) {
             for (const check::statement &st : s.statements)
                 given = given || (st.line != line && !st.skipped && st.keyword == r.name);
             if (!given || r.repeatable)
-                items.push_back(item(r.name, optional ? FIELD : KEYWORD, r.name + "=",
-                                     sort_key(n++)));
+                items.push_back(item(r.name, optional ? FIELD : KEYWORD, r.name + "=", sort_key(n++)));
         }
     return items;
 }
@@ -66,7 +65,8 @@ std::vector<std::string> values_of(const std::vector<const check::statement *> &
 }
 
 json value_words(const document &d, const cursor &c) {
-    const lang::statement_row *row = lang::find_row(*c.stanza->type, d.text().substr(c.parts.keyword.from, c.parts.keyword.to - c.parts.keyword.from));
+    const lang::statement_row *row = lang::find_row(
+        *c.stanza->type, d.text().substr(c.parts.keyword.from, c.parts.keyword.to - c.parts.keyword.from));
     if (!row)
         return json::array();
     using lang::value_kind;
@@ -86,7 +86,8 @@ json value_words(const document &d, const cursor &c) {
         std::string current = word_at(d, c.parts.value, c.offset, word);
         std::vector<std::string> names;
         for (int i = 0; i < row->props_count; i++)
-            if (row->props[i].s == current || listed.find("," + std::string(row->props[i].s) + ",") == std::string::npos)
+            if (row->props[i].s == current ||
+                listed.find("," + std::string(row->props[i].s) + ",") == std::string::npos)
                 names.push_back(row->props[i].s);
         return words(names, PROPERTY);
     }

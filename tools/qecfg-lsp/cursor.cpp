@@ -22,8 +22,8 @@ cursor cursor_at(const document &d, position p) {
         for (const check::statement &s : c.stanza->statements)
             if (s.line == c.piece)
                 c.statement = &s;
-    c.on_keyword = c.offset >= c.parts.keyword.from && c.offset <= c.parts.keyword.to &&
-                   c.parts.keyword.from < c.parts.keyword.to;
+    c.on_keyword =
+        c.offset >= c.parts.keyword.from && c.offset <= c.parts.keyword.to && c.parts.keyword.from < c.parts.keyword.to;
     c.after_equals = !c.parts.header && c.parts.value.from > c.parts.keyword.to && c.offset >= c.parts.value.from;
     c.on_value = c.after_equals && c.offset <= c.parts.value.to;
     return c;

@@ -18,8 +18,8 @@ json related(const document &d, const std::vector<check::diagnostic> &notes) {
 } // namespace
 
 byte_span finding_span(const document &d, const check::diagnostic &where) {
-    if (where.line == 0)
-        return {0, d.line(0).size()};
+    if (where.line == 0) // the whole file: an empty range at its start
+        return {0, 0};
     piece_parts p = d.parts(where.line);
     if (p.whole.to == p.whole.from) // a line the reader ignores
         return p.piece;

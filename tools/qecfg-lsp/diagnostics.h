@@ -9,8 +9,8 @@
 namespace lsp {
 
 // The span a finding on a compiler line points at: a statement's value when
-// the finding quotes it, else its keyword; a header's name; the first line
-// for a finding on the whole file.
+// the finding quotes it, else its keyword; a header's name; an empty span
+// at the start for a finding on the whole file.
 byte_span finding_span(const document &d, const check::diagnostic &where);
 
 // A publishDiagnostics notification for the document.

@@ -4,8 +4,8 @@
 #include <sstream>
 
 #include "cursor.h"
-#include "requests.h"
 #include "reference.h"
+#include "requests.h"
 
 namespace lsp {
 
@@ -77,7 +77,7 @@ std::string value_text(const check::stanza &s, const check::statement &st, const
     case value_kind::data_type:
     case value_kind::element_type: {
         zu_data_type_t t = lang::data_type_named(st.value);
-        std::string what = t == ZU_UNKNOWN ? "names no data type"
+        std::string what = t == ZU_UNKNOWN     ? "names no data type"
                            : lang::is_array(t) ? std::string("is an array of ") + zuTypeStr[lang::element_type_of(t)]
                                                : "is a data type";
         return "`" + st.value + "` " + what + "\n\n" + data_type_reference();
@@ -101,7 +101,8 @@ std::string value_text(const check::stanza &s, const check::statement &st, const
     case value_kind::valid_value:
     case value_kind::range: return typed_value(s, st) + "\n" + statement_reference(type, st.keyword);
     case value_kind::default_value:
-    case value_kind::initial_value: return typed_value(s, st) + bounds_of(s) + "\n" + statement_reference(type, st.keyword);
+    case value_kind::initial_value:
+        return typed_value(s, st) + bounds_of(s) + "\n" + statement_reference(type, st.keyword);
     default: return statement_reference(type, st.keyword);
     }
 }

@@ -23,5 +23,6 @@ int main(int argc, char **argv) {
     std::signal(SIGPIPE, SIG_IGN);
     lsp::fd_input in(STDIN_FILENO);
     bool writing = true;
-    return lsp::serve(in, [&](const std::string &body) { writing = writing && lsp::write_message(STDOUT_FILENO, body); });
+    return lsp::serve(in,
+                      [&](const std::string &body) { writing = writing && lsp::write_message(STDOUT_FILENO, body); });
 }

@@ -59,9 +59,9 @@ symbol class_symbol(const document &d, const std::vector<const check::stanza *> 
         } else if (s->type && s->type->structured_data) {
             symbol element = stanza_symbol(d, *s, FIELD);
             if (!run || !previous || previous->type != s->type) {
-                size_t owner = s->is("PAttrSDDefinition") || s->is("DAttrSDDefinition") ? attr
+                size_t owner = s->is("PAttrSDDefinition") || s->is("DAttrSDDefinition")          ? attr
                                : s->is("ActionInSDDefinition") || s->is("ActionOutSDDefinition") ? action
-                                                                                                   : SIZE_MAX;
+                                                                                                 : SIZE_MAX;
                 run_owner = owner == SIZE_MAX ? &c : &c.children[owner];
                 run_owner->children.push_back(
                     symbol{s->header, "structured data", STRUCT, element.range, element.selection, {}});
@@ -123,7 +123,8 @@ struct named_thing {
     std::vector<const check::statement *> definitions, uses;
 };
 
-std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v, const std::string &value) {
+std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v,
+                                               const std::string &value) {
     std::vector<const check::statement *> out;
     for (const check::statement *st : v)
         if (st->value == value)
@@ -137,7 +138,8 @@ bool thing_at(const document &d, const cursor &c, named_thing &thing) {
     const check::stanza &s = *c.stanza;
     const std::string &kw = c.statement->keyword, &value = c.statement->value;
     if (kw == "VariableClass" && (s.is_dynamic() || s.is("ResourceVariableClass"))) {
-        thing = {matching(variable_class_definitions(d.model()), value), matching(variable_class_uses(d.model()), value)};
+        thing = {matching(variable_class_definitions(d.model()), value),
+                 matching(variable_class_uses(d.model()), value)};
         return true;
     }
     if ((kw == "Locator" && s.is("ResourceClass")) || (kw == "Name" && s.is("PersistentResourceAttribute"))) {

@@ -35,7 +35,9 @@ template <typename F> std::string table_rows(const std::string &table, F keep) {
 
 } // namespace
 
-std::string stanza_reference(const lang::stanza_type &s) { return "### " + s.name + "\n\n" + block("stanza " + s.name); }
+std::string stanza_reference(const lang::stanza_type &s) {
+    return "### " + s.name + "\n\n" + block("stanza " + s.name);
+}
 
 std::string statement_reference(const lang::stanza_type &s, const std::string &keyword) {
     std::string row = "| `" + keyword + "` |";

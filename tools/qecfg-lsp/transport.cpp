@@ -3,6 +3,7 @@
 // point is reported, never waited on.
 #include "transport.h"
 
+#include <cctype>
 #include <cerrno>
 #include <cstring>
 #include <poll.h>
@@ -39,6 +40,17 @@ bool parse_length(const std::string &line, size_t &length) {
     }
     length = n;
     return true;
+}
+
+// After a message whose body was not consumed, that body runs into the next
+// header line: the line is read from its Content-Length on.
+void resynchronise(std::string &line) {
+    std::string lower = line;
+    for (char &c : lower)
+        c = char(std::tolower(static_cast<unsigned char>(c)));
+    size_t at = lower.find(CONTENT_LENGTH);
+    if (at != std::string::npos && at > 0)
+        line.erase(0, at);
 }
 
 } // namespace
@@ -134,7 +146,7 @@ frame_status message_reader::next(std::string &body) {
         any = true;
         if (s == line_status::too_long || lines >= MAX_HEADER_LINES)
             bad_header = true;
-        else if (starts_with_nocase(line, CONTENT_LENGTH)) {
+        else if (resynchronise(line), starts_with_nocase(line, CONTENT_LENGTH)) {
             // A second Content-Length, or one that is no plain count, leaves the length unknown.
             bad_header = bad_header || have_length || !parse_length(line, length);
             have_length = true;

@@ -43,11 +43,11 @@ class memory_input : public byte_input {
 
 // What the framing layer makes of the next message.
 enum class frame_status {
-    message,    // `body` holds one message
-    end,        // the input ended between messages
-    truncated,  // the input ended inside a message
-    no_length,  // a header block without a usable Content-Length
-    too_large,  // a Content-Length above the limit: the body was skipped
+    message,   // `body` holds one message
+    end,       // the input ended between messages
+    truncated, // the input ended inside a message
+    no_length, // a header block without a usable Content-Length
+    too_large, // a Content-Length above the limit: the body was skipped
 };
 
 class message_reader {
