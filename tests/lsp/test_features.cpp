@@ -99,6 +99,9 @@ TEST(LspFeatures, SettingsSwitchWarningsAndTheUnnamedClassRule) {
     std::string unnamed = replace_line(SOURCE, 9, "");
     session s(json{{"warnings", {{"unnamed-class", false}}}});
     EXPECT_TRUE(s.open(URI, unnamed).empty());
+    // An empty list is taken for an empty object: nothing changes.
+    s.notify("workspace/didChangeConfiguration", {{"settings", {{"warnings", json::array()}}}});
+    EXPECT_TRUE(s.last_diagnostics(URI).empty());
     s.notify("workspace/didChangeConfiguration",
              {{"settings", {{"qecfg", {{"warnings", {{"unnamed-class", true}}}}}}}});
     json d = s.last_diagnostics(URI);

@@ -161,7 +161,7 @@ void check_start_values(const stanza &s, const char *keyword, const char *limits
         return;
     for (const auto &[n, line] : start_values(s, keyword, type)) {
         if (n.unordered() ||
-            std::any_of(ranges.begin(), ranges.end(), [&](const value_range &r) { return r.holds(n); }))
+            std::any_of(ranges.begin(), ranges.end(), [&n = n](const value_range &r) { return r.holds(n); }))
             continue;
         std::string what =
             line ? keyword + std::string(" ") + n.text() : "the default " + n.text() + " (no " + keyword + ")";

@@ -15,14 +15,16 @@ document &workspace::named(const json &params) {
 }
 
 void workspace::configure(const json &settings) {
-    if (settings.is_null())
+    // Clients that cannot tell an empty object from an empty list send [].
+    auto empty = [](const json &v) { return v.is_null() || (v.is_array() && v.empty()); };
+    if (empty(settings))
         return;
     if (!settings.is_object())
         throw rpc_error{INVALID_PARAMS, "settings must be an object"};
     const std::vector<check::warning_check> &checks = check::warning_checks();
     std::vector<bool> enabled = check.enabled;
     enabled.resize(checks.size(), true);
-    if (auto w = settings.find("warnings"); w != settings.end()) {
+    if (auto w = settings.find("warnings"); w != settings.end() && !empty(*w)) {
         if (!w->is_object())
             throw rpc_error{INVALID_PARAMS, "'warnings' must be an object of booleans"};
         for (const auto &[name, on] : w->items()) {

@@ -1,8 +1,12 @@
--- Neovim's own LSP client against qecfg-lsp: diagnostics (also after edits),
--- hover, completion, a definition jump, document symbols, a code action
--- applied and a formatting edit. Run headless; the exit status tells.
---   QECFG_LSP=path/to/qecfg-lsp QECFG_LSP_WORK=dir nvim --headless --clean -c 'luafile client_test.lua'
+-- Neovim's own LSP client, started by the shipped configuration
+-- (editors/nvim/qecfg-lsp.lua, with the Vim file type detection), against
+-- qecfg-lsp: diagnostics (also after edits), hover, completion, a definition
+-- jump, document symbols, a code action applied and a formatting edit. Run
+-- headless; the exit status tells.
+--   QECFG_LSP=path/to/qecfg-lsp QECFG_SOURCE_DIR=repo QECFG_LSP_WORK=dir \
+--     nvim --headless --clean -c 'luafile client_test.lua'
 local server = assert(os.getenv('QECFG_LSP'), 'QECFG_LSP not set')
+local repo = assert(os.getenv('QECFG_SOURCE_DIR'), 'QECFG_SOURCE_DIR not set')
 local work = assert(os.getenv('QECFG_LSP_WORK'), 'QECFG_LSP_WORK not set')
 local failures = {}
 
@@ -28,11 +32,18 @@ local DATATYPE, VARCLASS_USE, VARCLASS_DEF, DESCRIPTION = 14, 24, 34, 11
 local function run()
   local path = work .. '/demo.src'
   vim.fn.writefile(source, path)
+  vim.env.PATH = vim.fn.fnamemodify(server, ':p:h') .. ':' .. vim.env.PATH
+  vim.cmd('source ' .. repo .. '/editors/vim/ftdetect/qecfg.vim')
+  vim.cmd('luafile ' .. repo .. '/editors/nvim/qecfg-lsp.lua')
   vim.cmd('edit ' .. path)
   local buf = vim.api.nvim_get_current_buf()
-  local client = vim.lsp.start_client({ name = 'qecfg-lsp', cmd = { server }, root_dir = work })
-  assert(client, 'the client did not start')
-  vim.lsp.buf_attach_client(buf, client)
+  check(vim.bo[buf].filetype == 'qecfg', 'the file type is detected')
+  local client
+  vim.wait(5000, function()
+    client = (vim.lsp.buf_get_clients(buf)[1] or {}).id
+    return client ~= nil
+  end, 20)
+  assert(client, 'the configuration started no client')
 
   local function diagnostics() return vim.diagnostic.get(buf) end
   local function wait_for(what, cond)
