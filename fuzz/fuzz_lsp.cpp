@@ -12,6 +12,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     std::string input = "Content-Length: " + std::to_string(init.size()) + "\r\n\r\n" + init;
     input.append(reinterpret_cast<const char *>(data), size);
     lsp::memory_input in(std::move(input));
-    lsp::serve(in, [](const std::string &) {}, size_t(1) << 20);
+    lsp::serve(
+        in, [](const std::string &) {}, size_t(1) << 20);
     return 0;
 }

@@ -59,3 +59,43 @@ TEST(LspDocument, CommentsAndTrailingBlanksAreNoPartOfAStatement) {
 }
 
 } // namespace
+
+namespace {
+
+bool same_model(const check::source_model &a, const check::source_model &b) {
+    if (a.stanzas.size() != b.stanzas.size() || a.last_line != b.last_line)
+        return false;
+    for (size_t i = 0; i < a.stanzas.size(); i++) {
+        const check::stanza &x = a.stanzas[i], &y = b.stanzas[i];
+        if (x.line != y.line || x.header != y.header || x.type != y.type || x.statements.size() != y.statements.size())
+            return false;
+        for (size_t j = 0; j < x.statements.size(); j++) {
+            const check::statement &s = x.statements[j], &t = y.statements[j];
+            if (s.line != t.line || s.keyword != t.keyword || s.value != t.value || s.skipped != t.skipped ||
+                s.row != t.row)
+                return false;
+        }
+    }
+    return true;
+}
+
+// Edits within a line keep the model equal to a fresh reading of the text,
+// whether the statement is re-read alone or the whole text is.
+TEST(LspDocument, ModelAfterEditsEqualsAFreshReading) {
+    std::string text = slurp(QECFG_SOURCE_DIR "/examples/disk.src");
+    document d("u", text, 1);
+    const char *const inserts[] = {"x", "=", "\"", "#", " ", "", "\t", "\"\"", "Name=", "ab,c"};
+    unsigned seed = 19;
+    for (int i = 0; i < 400; i++) {
+        seed = seed * 1103515245 + 12345;
+        d.model(); // current before the edit, as after a request
+        int line = int(seed >> 8) % d.line_count();
+        int len = int(d.line(line).size());
+        int from = len ? int(seed >> 4) % (len + 1) : 0;
+        int to = std::min(len, from + int(seed >> 20) % 3);
+        d.replace({d.offset_of({line, from}), d.offset_of({line, to})}, inserts[(seed >> 12) % 10], i + 2);
+        ASSERT_TRUE(same_model(d.model(), check::read_model(d.text()))) << "edit " << i << " on line " << line;
+    }
+}
+
+} // namespace

@@ -60,6 +60,10 @@ class document {
 
   private:
     void reindex();
+    bool line_is_one_piece(size_t offset) const;
+    // Replaces the model's statement of a piece by a fresh reading of it;
+    // false when the piece is no statement of the model before or after.
+    bool reread_statement(int piece);
 
     std::string uri_;
     std::string text_;
