@@ -47,22 +47,26 @@ std::vector<const check::stanza *> class_holding(const check::source_model &m, i
     return cls;
 }
 
-std::vector<const check::statement *> locator_targets(const std::vector<const check::stanza *> &cls) {
+namespace {
+
+std::vector<const check::statement *> class_statements(const std::vector<const check::stanza *> &cls, const char *type,
+                                                       const char *keyword) {
     std::vector<const check::statement *> v;
     for (const check::stanza *s : cls)
-        if (s->is("PersistentResourceAttribute"))
-            if (const check::statement *name = s->first("Name"))
-                v.push_back(name);
+        if (s->is(type))
+            for (const check::statement *st : s->given(keyword))
+                v.push_back(st);
     return v;
 }
 
+} // namespace
+
+std::vector<const check::statement *> locator_targets(const std::vector<const check::stanza *> &cls) {
+    return class_statements(cls, "PersistentResourceAttribute", "Name");
+}
+
 std::vector<const check::statement *> locator_uses(const std::vector<const check::stanza *> &cls) {
-    std::vector<const check::statement *> v;
-    for (const check::stanza *s : cls)
-        if (s->is("ResourceClass"))
-            for (const check::statement *st : s->given("Locator"))
-                v.push_back(st);
-    return v;
+    return class_statements(cls, "ResourceClass", "Locator");
 }
 
 } // namespace lsp
