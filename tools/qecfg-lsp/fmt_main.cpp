@@ -1,11 +1,13 @@
 // qecfg-fmt: the canonical layout of class definition sources, for scripts
 // and CI. Without files it formats standard input to standard output.
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <fstream>
 #include <iostream>
 #include <sstream>
 #include <string>
+#include <sys/stat.h>
 #include <vector>
 
 #include "format.h"
@@ -27,16 +29,21 @@ bool read_all(std::istream &in, std::string &text) {
 }
 
 // Replaces a file through a temporary file beside it, so that a failure
-// leaves the old text.
+// leaves the old text; the file keeps its permission bits.
 bool write_file(const std::string &path, const std::string &text) {
+    struct stat old {};
+    if (stat(path.c_str(), &old) != 0)
+        return false;
     std::string tmp = path + ".qecfg-fmt.tmp";
     {
-        std::ofstream out(tmp, std::ios::binary);
+        std::ofstream out(tmp, std::ios::binary | std::ios::trunc);
         out << text;
         if (!out.flush())
             return std::remove(tmp.c_str()), false;
     }
-    return std::rename(tmp.c_str(), path.c_str()) == 0 || (std::remove(tmp.c_str()), false);
+    if (chmod(tmp.c_str(), old.st_mode & 07777) != 0 || std::rename(tmp.c_str(), path.c_str()) != 0)
+        return std::remove(tmp.c_str()), false;
+    return true;
 }
 
 int format_file(const std::string &path, mode m) {
