@@ -1,0 +1,166 @@
+// Document text and its indexes. Positions count UTF-16 code units; bytes
+// that are no valid UTF-8 count one unit each, so any text maps both ways.
+#include "document.h"
+
+#include <algorithm>
+#include <cstring>
+
+#include "lang.h"
+
+namespace lsp {
+
+namespace {
+
+// UTF-16 units of the character starting with byte `b`: a continuation byte
+// adds nothing, a four-byte sequence needs a surrogate pair.
+int units_of(unsigned char b) {
+    if ((b & 0xC0) == 0x80)
+        return 0;
+    return (b & 0xF8) == 0xF0 ? 2 : 1;
+}
+
+size_t upper_index(const std::vector<size_t> &starts, size_t offset) {
+    return size_t(std::upper_bound(starts.begin(), starts.end(), offset) - starts.begin());
+}
+
+} // namespace
+
+document::document(std::string uri, std::string text, int version)
+    : uri_(std::move(uri)), text_(std::move(text)), version_(version) {
+    reindex();
+}
+
+void document::replace(byte_span span, const std::string &with, int version) {
+    span.to = std::min(span.to, text_.size());
+    span.from = std::min(span.from, span.to);
+    bool within_line = std::memchr(text_.data() + span.from, '\n', span.to - span.from) == nullptr &&
+                       with.find('\n') == std::string::npos && line_is_one_piece(span.from);
+    text_.replace(span.from, span.to - span.from, with);
+    version_ = version;
+    bool fresh = !model_stale_;
+    reindex();
+    // Typing inside a statement re-reads that statement, not the document.
+    if (fresh && within_line && line_is_one_piece(span.from) && reread_statement(piece_at(span.from)))
+        model_stale_ = false;
+}
+
+bool document::line_is_one_piece(size_t offset) const {
+    int l = position_of(offset).line;
+    return line(l).size() + 1 <= lang::READ_PIECE;
+}
+
+bool document::reread_statement(int piece) {
+    auto after = std::upper_bound(model_.stanzas.begin(), model_.stanzas.end(), piece,
+                                  [](int l, const check::stanza &s) { return l < s.line; });
+    if (after == model_.stanzas.begin())
+        return false;
+    check::stanza &s = *(after - 1);
+    auto st = std::find_if(s.statements.begin(), s.statements.end(),
+                           [&](const check::statement &x) { return x.line == piece; });
+    piece_parts p = parts(piece);
+    if (st == s.statements.end() || p.header)
+        return false;
+    // The statement read under its stanza's header, as the reader reads it.
+    check::source_model one =
+        check::read_model(s.header + "\n" + text_.substr(p.piece.from, p.piece.to - p.piece.from));
+    if (one.stanzas.size() != 1 || one.stanzas[0].statements.size() != 1)
+        return false;
+    *st = std::move(one.stanzas[0].statements[0]);
+    st->line = piece;
+    return true;
+}
+
+void document::set_text(std::string text, int version) {
+    text_ = std::move(text);
+    version_ = version;
+    reindex();
+}
+
+void document::reindex() {
+    line_starts_.assign(1, 0);
+    piece_starts_.clear();
+    for (size_t pos = 0; pos < text_.size();) {
+        piece_starts_.push_back(pos);
+        size_t len = std::min(text_.size() - pos, lang::READ_PIECE);
+        const void *nl = std::memchr(text_.data() + pos, '\n', len);
+        if (nl) {
+            len = size_t(static_cast<const char *>(nl) - (text_.data() + pos)) + 1;
+            line_starts_.push_back(pos + len);
+        }
+        pos += len;
+    }
+    model_stale_ = true;
+}
+
+const check::source_model &document::model() const {
+    if (model_stale_) {
+        model_ = check::read_model(text_);
+        model_stale_ = false;
+    }
+    return model_;
+}
+
+std::string_view document::line(int n) const {
+    if (n < 0 || n >= line_count())
+        return {};
+    size_t from = line_starts_[size_t(n)];
+    size_t to = size_t(n) + 1 < line_starts_.size() ? line_starts_[size_t(n) + 1] - 1 : text_.size();
+    return std::string_view(text_).substr(from, to - from);
+}
+
+size_t document::offset_of(position p) const {
+    if (p.line < 0)
+        return 0;
+    if (p.line >= line_count())
+        return text_.size();
+    std::string_view l = line(p.line);
+    size_t i = 0;
+    for (int units = 0; i < l.size(); i++) {
+        int u = units_of(static_cast<unsigned char>(l[i]));
+        if (u && units + u > p.character)
+            break;
+        units += u;
+    }
+    return line_starts_[size_t(p.line)] + i;
+}
+
+position document::position_of(size_t offset) const {
+    offset = std::min(offset, text_.size());
+    size_t line = upper_index(line_starts_, offset) - 1;
+    int units = 0;
+    for (size_t i = line_starts_[line]; i < offset; i++)
+        units += units_of(static_cast<unsigned char>(text_[i]));
+    return {int(line), units};
+}
+
+int document::piece_at(size_t offset) const {
+    return piece_starts_.empty() ? 0 : int(std::max<size_t>(upper_index(piece_starts_, offset), 1));
+}
+
+piece_parts document::parts(int piece) const {
+    piece_parts p;
+    p.piece = p.whole = p.keyword = p.value = {text_.size(), text_.size()};
+    if (piece < 1 || piece > piece_count())
+        return p;
+    size_t from = piece_starts_[size_t(piece) - 1];
+    size_t to = size_t(piece) < piece_starts_.size() ? piece_starts_[size_t(piece)] : text_.size();
+    p.piece = {from, to > from && text_[to - 1] == '\n' ? to - 1 : to};
+    p.whole = p.keyword = p.value = {from, from};
+    // The reader's own comment rules decide what of the piece counts.
+    char copy[lang::READ_PIECE + 2];
+    std::memcpy(copy, text_.data() + from, to - from);
+    copy[to - from] = '\0';
+    if (!lang::strip_line_comment(copy))
+        return p;
+    size_t kept = std::strlen(copy);
+    p.whole = {from, from + kept};
+    p.header = copy[0] != ' ' && copy[0] != '\t';
+    size_t start = p.header ? 0 : std::strspn(copy, " \t");
+    const char *eq = p.header ? nullptr : static_cast<const char *>(std::memchr(copy + start, '=', kept - start));
+    size_t key_end = eq ? size_t(eq - copy) : kept;
+    p.keyword = {from + start, from + key_end};
+    p.value = eq ? byte_span{from + key_end + 1, from + kept} : byte_span{from + kept, from + kept};
+    return p;
+}
+
+} // namespace lsp
