@@ -16,26 +16,9 @@ qecfg_context::~qecfg_context() {
         std::free(p);
 }
 
-void qecfg_context::raise_fatal(const char *msg, const char *v1, const char *v2, uint64_t line, int code) {
-    if (source_fp) {
-        std::fclose(source_fp);
-        source_fp = nullptr;
-    }
-    std::string text;
-    if (msg) {
-        if (line != 0)
-            text = std::to_string(line) + ": ";
-        text += msg;
-        text += v1 ? v1 : "";
-        text += v2 ? v2 : "";
-        if (opt.newline_after_message)
-            text += "\n";
-    }
-    throw qecfg_fatal{text, code};
-}
-
-void qecfg_context::statement_error(const char *msg, const char *v1, const char *v2) {
-    raise_fatal(msg, v1, v2, linenum, 1);
+void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects, int err) {
+    int status = qecfg::message(id).status;
+    throw qecfg_fatal{id, line, std::vector<std::string>(subjects.begin(), subjects.end()), status ? status : err};
 }
 
 qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {
@@ -89,7 +72,7 @@ void qecfg_compiler::complete_class() {
 // The map's ResourceManager statement is the only source of the manager.
 void qecfg_compiler::build_manager() {
     if (!map.manager_given)
-        raise_fatal("No ResourceManager defined for the class-to-manager map", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_manager, 0);
     rsrc_mgr_t m{};
     m.rm_cb_ID = RSRC_MGR_ID;
     tbl *strings = new_tbl("ManagerStrings", 8192);
@@ -105,7 +88,7 @@ void qecfg_compiler::run() {
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
         release_output();
-        raise_fatal("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
+        raise_fatal(msg::out_of_memory, 0, {std::strerror(ENOMEM)}, ENOMEM);
     }
 }
 
@@ -113,12 +96,12 @@ void qecfg_compiler::compile() {
     read_source(opt.cdefsrc.c_str());
     finish_open_records();
     if (!cls.open())
-        raise_fatal("No classes defined", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_classes, 0);
     complete_class();
     if (vclass.open())
         vclass.complete();
     if (!map.open())
-        raise_fatal("No class-to-manager maps defined", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_maps, 0);
     map.complete();
     build_manager();
     bld_var_id_tbls();

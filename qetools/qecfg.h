@@ -75,7 +75,6 @@ class qecfg_compiler : public qecfg_context {
     std::unordered_map<uint32_t, tbl *> var_id_tbls;
 
     // the image
-    [[noreturn]] void raise_output_fatal(const char *msg, const char *v1, const char *v2, int code);
     void bld_cdb();
     size_t cdb_size();
     uint64_t class_dsect_size(rsrc_class_t *rc);

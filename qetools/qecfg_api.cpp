@@ -21,11 +21,12 @@ qecfg_options compile_options(const qecfg::source &src, const qecfg::options &o,
 }
 
 qecfg::result run(qecfg_options opt) {
+    bool newline = opt.newline_after_message;
     try {
         qecfg_compiler c(std::move(opt));
         c.run();
     } catch (const qecfg_fatal &f) {
-        return qecfg::result{f.code, f.message};
+        return qecfg::result{f.status, f.text(newline), f.id, qecfg::message(f.id).name, f.line};
     }
     return {};
 }

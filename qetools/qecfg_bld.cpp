@@ -109,7 +109,7 @@ size_t qecfg_compiler::cdb_size() {
     for (size_t i = 0; i < ncl; i++)
         size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(classes.t.tbl_base + i * sizeof(rsrc_class_t)));
     if (size >= MAX_IMAGE)
-        raise_output_fatal("CDB image exceeds 4 GiB", nullptr, nullptr, 1);
+        raise_fatal(msg::image_too_large, 0);
     return size_t(size);
 }
 
@@ -120,7 +120,7 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
         const tbl *t = static_cast<const tbl *>(ref.ptr);
         size_t n = tbl_used(t) / rec_size;
         if (n > MAX_TABLE_RECORDS)
-            raise_output_fatal("Too many records in table: ", t->tbl_name, nullptr, 1);
+            raise_fatal(msg::too_many_records, 0, {t->tbl_name});
         return uint16_t(n);
     };
     auto bytes = [](const cdb_ref_t &ref) { return tbl_used(static_cast<const tbl *>(ref.ptr)); };
@@ -143,17 +143,6 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
 // ---------------------------------------------------------------------------
 // The output file.
 
-void qecfg_compiler::raise_output_fatal(const char *msg, const char *v1, const char *v2, int code) {
-    release_output();
-    std::string text;
-    if (msg) {
-        text = std::string(msg) + (v1 ? v1 : "") + (v2 ? v2 : "");
-        if (opt.newline_after_message)
-            text += "\n";
-    }
-    throw qecfg_fatal{text, code};
-}
-
 // A failed build leaves nothing of its image behind.
 void qecfg_compiler::release_output() {
     if (image_pending)
@@ -161,8 +150,13 @@ void qecfg_compiler::release_output() {
     image_pending = false;
 }
 
+// The sink names its failure by the text its message begins with.
 [[noreturn]] void qecfg_compiler::output_failed(const sink_failure &f) {
-    raise_output_fatal(f.prefix, f.text ? f.text : std::strerror(f.err), nullptr, 1);
+    msg id = msg::cannot_write;
+    for (msg m : {msg::cannot_create, msg::cannot_extend, msg::cannot_map, msg::cannot_write})
+        if (std::string(qecfg::message(m).text) == std::string(f.prefix) + "%s")
+            id = m;
+    raise_fatal(id, 0, {f.text ? f.text : std::strerror(f.err)});
 }
 
 char *qecfg_compiler::acquire_image(size_t cdb_file_size) {
@@ -219,7 +213,7 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounde
 void qecfg_compiler::add_rsrc_class_tbls() {
     size_t n = tbl_used(&classes.t) / sizeof(rsrc_class_t);
     if (!n)
-        raise_output_fatal("No Rsrc Class Tables found", nullptr, nullptr, 1);
+        raise_fatal(msg::no_class_dsects, 0);
     static const size_t copied[] = {
         offsetof(rsrc_class_t, u_rc_pattrsC),  offsetof(rsrc_class_t, u_rc_dattrsC),
         offsetof(rsrc_class_t, u_rc_pattrs),   offsetof(rsrc_class_t, u_rc_dattrs),
@@ -258,7 +252,7 @@ void qecfg_compiler::note_numeric_ranges(const tbl *t) {
 void qecfg_compiler::add_rsrc_mgr_tbls() {
     size_t n = tbl_used(&managers.t) / sizeof(rsrc_mgr_t);
     if (!n)
-        raise_output_fatal("No Rsrc Manager tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_manager_dsects, 0);
     for (size_t i = 0; i < n; i++) {
         const char *src = managers.t.tbl_base + i * sizeof(rsrc_mgr_t);
         char *rec = copy_record(CDB_DSECT_RSRC_MGR, src, sizeof(rsrc_mgr_t));
@@ -277,7 +271,7 @@ void qecfg_compiler::add_rsrc_mgr_tbls() {
 void qecfg_compiler::add_rsrc_cmmap_tbls() {
     size_t n = tbl_used(&maps.t) / sizeof(rsrc_cmmap_t);
     if (!n)
-        raise_output_fatal("No Rsrc CMMAP tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_map_dsects, 0);
     for (size_t i = 0; i < n; i++) {
         const char *src = maps.t.tbl_base + i * sizeof(rsrc_cmmap_t);
         char *rec = copy_record(CDB_DSECT_CMMAP, src, sizeof(rsrc_cmmap_t));
@@ -289,7 +283,7 @@ void qecfg_compiler::add_rsrc_cmmap_tbls() {
 void qecfg_compiler::add_rsrc_var_class_tbls() {
     size_t n = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
     if (!n)
-        raise_output_fatal("No Rsrc Variable Class tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_variable_class_dsects, 0);
     for (size_t i = 0; i < n; i++) {
         const char *src = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         char *rec = copy_record(CDB_DSECT_VAR_CLASS, src, sizeof(rsrc_variable_class_t));

@@ -4,18 +4,32 @@
 #define QECFG_CONTEXT_H
 
 #include <cstdio>
+#include <initializer_list>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "qecfg/messages.h"
 #include "qecfg_tbl.h"
 
-// Every fatal condition of a compile becomes one of these; only main turns
-// it into the message on standard error and the exit status.
+using msg = qecfg::message_id;
+
+// Every fatal condition of a compile becomes one of these: a row of the
+// message table with its subjects and line. Only the library's boundary
+// turns it into the text, and main into the exit status.
 struct qecfg_fatal {
-    std::string message; // the full text, terminator included
-    int code;            // the exit status
+    msg id;
+    uint64_t line = 0;
+    std::vector<std::string> subjects;
+    int status = 1; // the row's, or the system's error number
+
+    std::string text(bool newline) const { return qecfg::format_message(id, line, subjects, newline); }
 };
+
+// Ends the compile with a message of the table. err is the system's error
+// number, the status of the rows that take it.
+[[noreturn]] void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects = {},
+                              int err = 0);
 
 struct qecfg_options {
     int newline_after_message = 1; // -n clears it
@@ -70,10 +84,10 @@ class qecfg_context {
     uint64_t linenum = 0;      // pieces of input read; more than 2^31 is possible
     FILE *source_fp = nullptr; // open while the source is read
 
-    // Raise a fatal condition: "LINE: " (unless line is 0), the texts, and
-    // the newline unless -n was given.
-    [[noreturn]] void raise_fatal(const char *msg, const char *v1, const char *v2, uint64_t line, int code);
-    [[noreturn]] void statement_error(const char *msg, const char *v1 = nullptr, const char *v2 = nullptr);
+    // A fatal condition at the line being read.
+    [[noreturn]] void statement_error(msg id, std::initializer_list<std::string_view> subjects = {}) {
+        raise_fatal(id, linenum, subjects);
+    }
 
     // growable tables
     void *cfg_malloc(size_t s);

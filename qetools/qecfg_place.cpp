@@ -82,10 +82,10 @@ int qecfg_context::copy_this_type(value_slot out_data, const zu_value_t *in_data
     switch (type_in) {
     case ZU_NONE: return 0;
     case ZU_SD_PTR:
-        raise_fatal("copy_this_type: this function does not handle SD type", nullptr, nullptr, 0, 1);
-    case ZU_SBS_PTR: raise_fatal("ZU_SBS_TYPE not supported", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::place_structured, 0);
+    case ZU_SBS_PTR: raise_fatal(msg::place_sbs, 0);
     case ZU_SD_PTR_ARRAY:
-        raise_fatal("copy_this_type: this function does not handle SD ARRAY type", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::place_structured_array, 0);
     case ZU_RSRC_HANDLE_PTR: return place_scalar(out_data, nullptr, type_in, TYPE_SAME, str_tbl, false);
     default: break;
     }
@@ -107,7 +107,7 @@ int qecfg_context::copy_this_type(value_slot out_data, const zu_value_t *in_data
 void qecfg_context::init_array(tbl *str_tbl, body_cursor *a, uint32_t array_cnt, value_slot out_data,
                                 uint32_t *elem_idx) {
     if (array_cnt == 0)
-        raise_fatal("Attempt to write NULL array", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::place_empty_array, 0);
     if (!a->set) {
         uint32_t off = append_zero_body(str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
         *a = body_cursor{true, off};
@@ -141,7 +141,7 @@ void qecfg_context::init_scalar_sd(tbl *str_tbl, body_cursor *a, uint32_t sd_cnt
 void qecfg_context::init_array_sd(tbl *str_tbl, body_cursor *array_anchor, body_cursor *sd_anchor, uint32_t array_cnt,
                                    uint32_t sd_cnt, value_slot out_data, uint32_t *sd_elem_idx) {
     if (array_cnt == 0)
-        raise_fatal("Attempt to write NULL array", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::place_empty_array, 0);
     if (!array_anchor->set) {
         uint32_t off = append_zero_body(str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
         *array_anchor = body_cursor{true, off};
@@ -161,7 +161,7 @@ int qecfg_context::copy_this_sd_type(value_slot out_data, zu_data_type_t type_in
     else if (sd_type == ZU_SD_PTR_ARRAY)
         init_array_sd(str_tbl, sd_array_anchor, sd_element_anchor, 1, array_cnt, out_data, &idx);
     else
-        raise_fatal("copy_this_sd_type: only SD types allowed", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::place_structured_only, 0);
     if (array_cnt == 0)
         return 0;
     uint32_t element = sd_element_anchor->off + uint32_t(ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * idx);

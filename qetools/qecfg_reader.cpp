@@ -24,13 +24,14 @@ class piece_reader {
     // The next piece, or null at the end of the input; a read error is
     // reported through err.
     char *next(int &err) {
+        nul_ = false;
         if (pos_ == len_ && !refill(err))
             return nullptr;
         char *start = buf_.data() + pos_;
         size_t avail = std::min(len_ - pos_, PIECE_MAX);
         if (char *nl = static_cast<char *>(std::memchr(start, '\n', avail))) {
             *nl = '\0';
-            pos_ += size_t(nl - start) + 1;
+            advance(size_t(nl - start) + 1);
             return start;
         }
         size_t n = 0;
@@ -44,13 +45,16 @@ class piece_reader {
                 take = size_t(static_cast<const char *>(nl) - from) + 1;
             std::memcpy(line_ + n, from, take);
             n += take;
-            pos_ += take;
+            advance(take);
             if (nl)
                 break;
         }
         line_[n] = '\0';
         return n > 0 && err == 0 ? line_ : nullptr;
     }
+
+    // The last piece held a NUL byte, which would end it early.
+    bool held_nul() const { return nul_; }
 
   private:
     static constexpr size_t BUFFER_SIZE = 1 << 16;
@@ -60,12 +64,22 @@ class piece_reader {
         len_ = std::fread(buf_.data(), 1, BUFFER_SIZE, fp_);
         if (len_ == 0 && std::ferror(fp_))
             err = errno ? errno : EIO;
+        const void *nul = std::memchr(buf_.data(), '\0', len_);
+        nul_at_ = nul ? size_t(static_cast<const char *>(nul) - buf_.data()) : len_;
         return len_ > 0;
+    }
+
+    // Moves past n bytes of the buffer, noting the NUL among them.
+    void advance(size_t n) {
+        nul_ = nul_ || (nul_at_ >= pos_ && nul_at_ < pos_ + n);
+        pos_ += n;
     }
 
     FILE *fp_;
     std::vector<char> buf_;
     size_t pos_ = 0, len_ = 0;
+    size_t nul_at_ = 0; // the first NUL byte of the buffer, or len_
+    bool nul_ = false;
     char line_[LINE_BUFFER];
 };
 
@@ -145,14 +159,14 @@ int find_stanza_type(const char *name) {
 void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyword_row &row, const char *name) {
     if (row.optional) {
         if (given.required != stanza_defs[stanza].required_mask)
-            c.statement_error("Optional attribute discovered before all required attributes have been defined", name);
+            c.statement_error(msg::optional_before_required, {name});
         if ((given.optional & row.bit) && !row.repeatable)
-            c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
+            c.statement_error(msg::duplicate_statement, {name});
         given.optional |= row.bit;
         return;
     }
     if ((given.required & row.bit) && !row.repeatable)
-        c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
+        c.statement_error(msg::duplicate_statement, {name});
     given.required |= row.bit;
     if (c.opt.debugLevel > 1)
         QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
@@ -164,12 +178,14 @@ void qecfg_compiler::read_source(const char *filename) {
     source_fp = opt.source_in_memory ? open_memory_source(opt.source_text) : std::fopen(filename, "r");
     if (!source_fp) {
         int e = errno;
-        raise_fatal(filename, ": cannot open because: ", std::strerror(e), 0, e);
+        raise_fatal(msg::cannot_open, 0, {filename, std::strerror(e)}, e);
     }
     piece_reader reader(source_fp);
     int err = 0;
     while (char *line = reader.next(err)) {
         linenum++;
+        if (reader.held_nul())
+            statement_error(msg::nul_character);
         if (!strip_comments(line))
             continue;
         if (line[0] == ' ' || line[0] == '\t')
@@ -179,7 +195,7 @@ void qecfg_compiler::read_source(const char *filename) {
     }
     // A read error is not the end of the input.
     if (err)
-        raise_fatal(filename, ": cannot read because: ", std::strerror(err), 0, err);
+        raise_fatal(msg::cannot_read, 0, {filename, std::strerror(err)}, err);
     std::fclose(source_fp);
     source_fp = nullptr;
 }
@@ -203,7 +219,7 @@ stanza_builder &qecfg_compiler::builder_of(int t) {
 void qecfg_compiler::read_header(char *line) {
     int t = find_stanza_type(line);
     if (t < 0)
-        statement_error("Invalid table name: ", line);
+        statement_error(msg::invalid_stanza, {line});
     prev_stanza = stanza;
     stanza = t;
     if (is_sd_stanza(t)) {
@@ -243,7 +259,7 @@ void qecfg_compiler::complete_open_actions() {
 
 void qecfg_compiler::read_statement(char *il) {
     if (stanza < 0)
-        statement_error("Attribute found but no table defined yet");
+        statement_error(msg::statement_before_stanza);
     const stanza_def &def = stanza_defs[stanza];
     char *name = il;
     while (*name == ' ' || *name == '\t')
@@ -252,26 +268,26 @@ void qecfg_compiler::read_statement(char *il) {
         return;
     char *eq = std::strchr(name, '=');
     if (!eq)
-        statement_error("Missing '=' after attribute name");
+        statement_error(msg::missing_equals);
     *eq = '\0';
     char *value = eq + 1;
     if (std::strcmp(value, "\"\"") == 0)
         return;
     value = strip_quotes(value);
     if (!value)
-        statement_error("Unmatched double quotes for attribute: ", name);
+        statement_error(msg::unmatched_quotes, {name});
     if (std::strlen(value) > QECFG_MAX_VALUE_LEN)
-        statement_error("Attibute value exceeds maximum length: ", name);
+        statement_error(msg::value_too_long, {name});
     const keyword_row *row = nullptr;
     size_t name_len = size_t(eq - name);
     for (int i = 0; i < def.num_rows && !row; i++)
         if (row_name_len[stanza][i] == name_len && std::memcmp(def.rows[i].name, name, name_len) == 0)
             row = &def.rows[i];
     if (!row)
-        statement_error("Attribute name not defined in table (name/table): ", name, def.name);
+        statement_error(msg::unknown_keyword, {name, def.name});
     if (!*value) {
         QECFG_TRACE(*this, "In file %s: ", opt.cdefsrc.c_str());
-        statement_error("Missing attribute value: ", name);
+        statement_error(msg::missing_value, {name});
     }
     if (opt.debugLevel > 1)
         QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, name, value,

@@ -27,7 +27,7 @@ void *qecfg_context::cfg_malloc(size_t s) {
     void *p = std::calloc(1, block);
     if (!p) {
         int e = errno;
-        raise_fatal("cfg_malloc malloc failure: ", std::strerror(e), nullptr, 0, e);
+        raise_fatal(msg::out_of_memory, 0, {std::strerror(e)}, e);
     }
     owned_blocks.push_back(p);
     if (block == CHUNK) {
@@ -96,7 +96,7 @@ void *qecfg_context::alloc_tble(tbl *t, size_t s) {
         t->tbl_size = 0;
         if (!reserve_block(t, std::max<size_t>(s, 1))) { // a table always has a block
             int e = errno;
-            raise_fatal(t->tbl_name, ": alloc_tble malloc failure: ", std::strerror(e), 0, e);
+            raise_fatal(msg::table_malloc, 0, {t->tbl_name, std::strerror(e)}, e);
         }
         t->tbl_size = t->tbl_au;
         t->tbl_next = t->tbl_base;
@@ -116,7 +116,7 @@ void *qecfg_context::alloc_tble(tbl *t, size_t s) {
     }
     if (!reserve_block(t, used + s)) {
         int e = errno;
-        raise_fatal(t->tbl_name, ": alloc_tble realloc failure: ", std::strerror(e), 0, e);
+        raise_fatal(msg::table_realloc, 0, {t->tbl_name, std::strerror(e)}, e);
     }
     // Items are handed out zero-filled; the room behind them is left untouched.
     char *item = t->tbl_next;

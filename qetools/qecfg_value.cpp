@@ -277,7 +277,7 @@ void qecfg_context::set_props(uint32_t *dest, const props_t *props, int len, cha
             if (std::strcmp(name, props[i].s) == 0)
                 found = &props[i];
         if (!found)
-            raise_fatal(name, ": invalid property", nullptr, 0, 1);
+            raise_fatal(msg::invalid_property, 0, {name});
         *dest |= found->p;
     }
 }

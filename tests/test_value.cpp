@@ -355,8 +355,9 @@ TEST_F(ValueConvert, UnknownPropertyStopsWithItsName) {
             c.set_props(&dest, test_props, TEST_PROPS_SEARCHED, buf.data());
             ADD_FAILURE() << text << " was accepted";
         } catch (const qecfg_fatal &f) {
-            EXPECT_EQ(f.message, string(name) + ": invalid property\n");
-            EXPECT_EQ(f.code, 1);
+            EXPECT_EQ(f.id, msg::invalid_property);
+            EXPECT_EQ(f.text(true), string(name) + ": invalid property\n");
+            EXPECT_EQ(f.status, 1);
         }
     }
 }
