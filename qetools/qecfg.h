@@ -39,8 +39,8 @@ class qecfg_compiler : public qecfg_context {
     void compile();
     // reader and stanza framing
     void read_source(const char *filename);
-    void read_header(char *line);
-    void read_statement(char *line);
+    void read_header(const struct source_line &header);
+    void read_statement(const struct source_line &statement);
     stanza_builder &builder_of(int stanza);
     void start_stanza(int stanza);
     void complete_open_actions();
@@ -64,7 +64,6 @@ class qecfg_compiler : public qecfg_context {
     action_builder actions[2]{{*this, cls, ST_CLASS_ACTION}, {*this, cls, ST_RESOURCE_ACTION}};
     sd_run sd{*this, cls, actions};
     int stanza = -1, prev_stanza = -1; // of the last header and the one before
-    size_t row_name_len[NUM_STANZA_TYPES][MAX_ROWS_PER_STANZA] = {};
 
     // variable IDs: the first variable class of each name by record offset,
     // the ID tables by record offset

@@ -57,11 +57,6 @@ enum placement_code {
     R_HI_DEFAULT = 7,
 };
 
-// Cuts comments and the newline off a piece of a source line; false when
-// nothing is left to process (a comment line or a line of blanks, tabs and
-// quotes). The checker reads sources through it too.
-bool strip_comments(char *line);
-
 // Conversions of value text (no compile state involved).
 zu_data_type_t strToZuDt(const char *s);
 int strToVar(const char *s, qel_variable_type_t *t);

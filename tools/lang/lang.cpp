@@ -1,6 +1,7 @@
 // The language view over the compiler's keyword table. The only place that
 // classifies the compiler's statements for the checker and the documents.
 #include "lang.h"
+#include "qecfg_source.h"
 
 #include <cstring>
 
