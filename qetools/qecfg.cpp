@@ -11,10 +11,6 @@
 qecfg_context::~qecfg_context() {
     if (source_fp)
         std::fclose(source_fp);
-    for (tbl *t : owned_tbls)
-        std::free(t->tbl_base);
-    for (void *p : owned_blocks)
-        std::free(p);
 }
 
 void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects, int err) {
@@ -24,14 +20,7 @@ void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> 
 
 qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {}
 
-qecfg_compiler::~qecfg_compiler() {
-    release_output();
-    for (record_table *r : {&classes, &maps, &managers, &var_classes})
-        std::free(r->t.tbl_base);
-    // The lists of the builders are tables of their own.
-    for (attr_builder &a : attrs)
-        a.release_lists();
-}
+qecfg_compiler::~qecfg_compiler() { release_output(); }
 
 namespace {
 

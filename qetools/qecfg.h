@@ -30,10 +30,10 @@ class qecfg_compiler : public qecfg_context {
     // The compile: read the source, complete everything, build the CDB.
     void run();
 
-    record_table classes{{nullptr, nullptr, 0, 3584, "ResourceClasses", 0}};
-    record_table maps{{nullptr, nullptr, 0, 480, "ResourceCMMaps", 0}};
-    record_table managers{{nullptr, nullptr, 0, 192, "ResourceManagers", 0}};
-    record_table var_classes{{nullptr, nullptr, 0, 320, "ResourceVariableClasses", 0}};
+    record_table classes{"ResourceClasses", 3584};
+    record_table maps{"ResourceCMMaps", 480};
+    record_table managers{"ResourceManagers", 192};
+    record_table var_classes{"ResourceVariableClasses", 320};
 
   private:
     void compile();

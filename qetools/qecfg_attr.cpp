@@ -83,12 +83,9 @@ void attr_builder::start() {
     }
     vvdisp_tbl = nullptr;
     valid_values_started = range_given = false;
-    release_lists(); // those of the previous attribute are spent
-}
-
-void attr_builder::release_lists() {
-    c.release_storage(&values.t);
-    c.release_storage(&element_types.t);
+    // The lists of the previous attribute are spent.
+    values.t.release();
+    element_types.t.release();
 }
 
 void attr_builder::store_statement(const keyword_row &row, char *v) {
@@ -126,7 +123,7 @@ void attr_builder::store_default(const char *v) {
         c.statement_error(msg::default_for_structured);
     char *slot = values.take(c);
     zu_value_t val{};
-    if (c.str_to_zu(&val, dt, v) != 0)
+    if (str_to_zu(c, &val, dt, v) != 0)
         c.statement_error(msg::invalid_data);
     store(slot, val);
 }
@@ -162,7 +159,7 @@ void attr_builder::build_structured_value() {
     int code = dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT;
     for (uint32_t i = 0; i < n; i++) {
         array = body_cursor{};
-        if (c.copy_this_sd_type(value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
+        if (copy_this_sd_type(c, value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
                                 data_type()) != 0)
             c.statement_error(dynamic_ ? msg::structured_initial_not_built : msg::structured_default_not_built);
     }
@@ -205,13 +202,13 @@ void attr_builder::complete_value() {
         body_cursor array;
         for (uint32_t i = 0; i < n; i++) {
             zu_value_t v = values.at(i);
-            if (c.copy_this_type(value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
+            if (copy_this_type(c, value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
                 c.statement_error(msg::default_not_placed);
         }
         return;
     }
     body_cursor a;
-    if (c.copy_this_type(value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
+    if (copy_this_type(c, value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
         c.statement_error(dynamic_ ? msg::initial_value_not_built : msg::default_value_not_built);
 }
 
@@ -240,17 +237,17 @@ void attr_builder::complete_range() {
         }
         if (dt == ZU_SD_PTR_ARRAY) {
             body_cursor a[3];
-            if (c.copy_this_sd_type(lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            if (copy_this_sd_type(c, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
                 c.statement_error(msg::range_low_not_built);
             body_cursor b[3];
-            if (c.copy_this_sd_type(hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            if (copy_this_sd_type(c, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
                 c.statement_error(msg::range_high_not_built);
         } else {
             body_cursor a;
-            if (c.copy_this_type(lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
+            if (copy_this_type(c, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
                 c.statement_error(msg::range_low_not_built);
             body_cursor b;
-            if (c.copy_this_type(hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
+            if (copy_this_type(c, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
                 c.statement_error(msg::range_high_not_built);
         }
     }

@@ -207,7 +207,8 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounde
     else if (len)
         std::memcpy(dsp, t->tbl_base, len);
     grow_dsect(rounded ? round8(len) : len);
-    release_storage(t);
+    if (t)
+        t->release();
 }
 
 void qecfg_compiler::add_rsrc_class_tbls() {
@@ -291,7 +292,8 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         size_t len = tbl_used(strings);
         memcpy_8_rounded(dsp, strings ? strings->tbl_base : nullptr, len);
         grow_dsect(round8(len));
-        release_storage(strings);
+        if (strings)
+            strings->release();
         // The reference holds the rounded string length: the IDs follow.
         cdb_ref_t ref{};
         ref.offset[0] = uint32_t(round8(len));
@@ -299,7 +301,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         if (tbl *ids = find_tbl_entry(src)) {
             memcpy_8_rounded(dsp, ids->tbl_base, tbl_used(ids));
             grow_dsect(round8(tbl_used(ids)));
-            release_storage(ids);
+            ids->release();
         }
         dsect_idx++;
     }

@@ -150,7 +150,7 @@ void sd_run::store_statement(const keyword_row &row, char *v) {
 
 void sd_run::store_element_index(const char *v) {
     zu_value_t val{};
-    if (c.str_to_zu(&val, ZU_UINT32, v) != 0)
+    if (str_to_zu(c, &val, ZU_UINT32, v) != 0)
         c.statement_error(msg::invalid_data);
     curr_sdeli = int(val.val_uint32);
     if (curr_sdeli != expected_sdeli) {

@@ -62,7 +62,7 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
             {rc_props, rc_props_cnt}, {pa_props, pa_props_cnt}, {da_props, da_props_cnt}, {act_props, act_props_cnt}};
         auto &k = tables[int(row.what) - int(statement::class_properties)];
         uint32_t w = load<uint32_t>(target);
-        c.set_props(&w, k.props, k.count, v);
+        set_props(&w, k.props, k.count, v);
         store<uint32_t>(target, w);
         break;
     }
@@ -128,18 +128,18 @@ void stanza_builder::place_pair(zu_data_type_t dt, char *v, value_slot low, valu
     char *comma = std::strchr(v, ',');
     if (comma) {
         *comma = '\0';
-        if (c.str_to_zu(&val, dt, comma + 1) != 0)
+        if (str_to_zu(c, &val, dt, comma + 1) != 0)
             c.statement_error(msg::invalid_data);
-        if (c.copy_this_type(high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+        if (copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
             c.statement_error(msg::value_not_placed);
         val = zu_value_t{};
-        if (c.str_to_zu(&val, dt, v) != 0 || c.copy_this_type(low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+        if (str_to_zu(c, &val, dt, v) != 0 || copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
             c.statement_error(msg::invalid_data);
         return;
     }
-    if (c.str_to_zu(&val, dt, v) != 0)
+    if (str_to_zu(c, &val, dt, v) != 0)
         c.statement_error(msg::invalid_data);
-    if (c.copy_this_type(low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
-        c.copy_this_type(high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+    if (copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
+        copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
         c.statement_error(msg::value_not_placed);
 }
