@@ -20,7 +20,6 @@ void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> 
 
 qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {}
 
-qecfg_compiler::~qecfg_compiler() { release_output(); }
 
 namespace {
 
@@ -203,7 +202,6 @@ void qecfg_compiler::run() {
         compile();
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
-        release_output();
         raise_fatal(msg::out_of_memory, 0, {std::strerror(ENOMEM)}, ENOMEM);
     }
 }
@@ -220,6 +218,11 @@ void qecfg_compiler::compile() {
         raise_fatal(msg::no_maps, 0);
     map.complete();
     build_manager();
-    bld_var_id_tbls();
-    bld_cdb();
+    cdb_writer writer(*this, output_target(), opt.swap_endianness);
+    writer.write(compiled_records{classes, maps, managers, var_classes, vclass.named, numeric_ranges});
+}
+
+image_target qecfg_compiler::output_target() const {
+    return image_target{opt.sink, opt.cdefname,
+                        opt.source_in_memory ? file_identity{} : identity_of(opt.cdefsrc)};
 }

@@ -16,8 +16,8 @@ struct record_table {
     record_table(const char *name, size_t au) : t(name, au) {}
     tbl t;
     uint32_t count = 0;
-    template <typename R> void append(qecfg_context &c, const R &rec) {
-        std::memcpy(c.alloc_tble(&t, sizeof(R)), &rec, sizeof(R));
+    template <typename R> void append(table_arena &arena, const R &rec) {
+        std::memcpy(arena.alloc_tble(&t, sizeof(R)), &rec, sizeof(R));
         count++;
     }
 };
