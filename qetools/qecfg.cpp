@@ -37,14 +37,14 @@ void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyw
     if ((given.required & row.bit) && !row.repeatable)
         c.statement_error(msg::duplicate_statement, {name});
     given.required |= row.bit;
-    if (c.opt.debugLevel > 1)
+    if (c.opt.trace_level > 1)
         QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
 }
 
 } // namespace
 
 void qecfg_compiler::read_source(const char *filename) {
-    source_fp = opt.source_in_memory ? open_memory_source(opt.source_text) : std::fopen(filename, "r");
+    source_fp = opt.source.in_memory ? open_memory_source(opt.source.text) : std::fopen(filename, "r");
     if (!source_fp) {
         int e = errno;
         raise_fatal(msg::cannot_open, 0, {filename, std::strerror(e)}, e);
@@ -134,10 +134,10 @@ void qecfg_compiler::read_statement(const source_line &s) {
     if (!s.row)
         statement_error(msg::unknown_keyword, {s.name, def.name});
     if (s.value_length == 0) {
-        QECFG_TRACE(*this, "In file %s: ", opt.cdefsrc.c_str());
+        QECFG_TRACE(*this, "In file %s: ", opt.source.name.c_str());
         statement_error(msg::missing_value, {s.name});
     }
-    if (opt.debugLevel > 1)
+    if (opt.trace_level > 1)
         QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, s.name, s.value,
                     int(s.value_length));
     stanza_builder &b = builder_of(stanza);
@@ -207,7 +207,7 @@ void qecfg_compiler::run() {
 }
 
 void qecfg_compiler::compile() {
-    read_source(opt.cdefsrc.c_str());
+    read_source(opt.source.name.c_str());
     finish_open_records();
     if (!cls.open())
         raise_fatal(msg::no_classes, 0);
@@ -218,11 +218,11 @@ void qecfg_compiler::compile() {
         raise_fatal(msg::no_maps, 0);
     map.complete();
     build_manager();
-    cdb_writer writer(*this, output_target(), opt.swap_endianness);
+    cdb_writer writer(*this, output_target(), opt.reverse_byte_order);
     writer.write(compiled_records{classes, maps, managers, var_classes, vclass.named, numeric_ranges});
 }
 
 image_target qecfg_compiler::output_target() const {
-    return image_target{opt.sink, opt.cdefname,
-                        opt.source_in_memory ? file_identity{} : identity_of(opt.cdefsrc)};
+    return image_target{opt.sink, opt.output_name,
+                        opt.source.in_memory ? file_identity{} : identity_of(opt.source.name)};
 }

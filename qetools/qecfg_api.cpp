@@ -8,20 +8,14 @@ namespace {
 
 qecfg_options compile_options(const qecfg::source &src, const qecfg::options &o, const std::string &output_name) {
     qecfg_options opt;
-    opt.newline_after_message = o.message_newline;
-    opt.debugLevel = o.trace_level;
-    opt.swap_endianness = o.reverse_byte_order;
-    opt.cdefsrc = src.name;
-    opt.cdefname = output_name;
-    opt.trace_out = o.trace_out;
-    opt.trace_err = o.trace_err;
-    opt.source_in_memory = src.in_memory;
-    opt.source_text = src.text;
+    static_cast<qecfg::options &>(opt) = o;
+    opt.output_name = output_name;
+    opt.source = src;
     return opt;
 }
 
 qecfg::result run(qecfg_options opt) {
-    bool newline = opt.newline_after_message;
+    bool newline = opt.message_newline;
     try {
         qecfg_compiler c(std::move(opt));
         c.run();

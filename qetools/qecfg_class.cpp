@@ -50,10 +50,10 @@ void class_builder::store_statement(const keyword_row &row, char *v) {
 
 // An unnamed class takes the output file name up to its first ".cdef".
 void class_builder::name_from_output() {
-    size_t pos = c.opt.cdefname.find(".cdef");
+    size_t pos = c.opt.output_name.find(".cdef");
     if (pos == std::string::npos)
         raise_fatal(msg::unnamed_class_output, 0);
-    std::string name = c.opt.cdefname.substr(0, pos);
+    std::string name = c.opt.output_name.substr(0, pos);
     rec.u_rc_name.offset[0] = c.add_to_tbl(strings(), name.c_str(), name.size() + 1);
 }
 

@@ -9,29 +9,22 @@
 #include <string_view>
 #include <vector>
 
+#include "qecfg/qecfg.h"
 #include "qecfg_fatal.h"
 #include "qecfg_tbl.h"
 #include "qecfg_value.h"
 
-struct qecfg_options {
-    int newline_after_message = 1; // -n clears it
-    int debugLevel = 0;
-    int swap_endianness = 0;
-    std::string cdefsrc;
-    std::string cdefname;
-    FILE *trace_out = stdout; // traces
-    FILE *trace_err = stderr; // the table growth trace
-    // A source held in memory (cdefsrc is then only its name).
-    bool source_in_memory = false;
-    std::string_view source_text;
-    // Where the image goes; the file cdefname when null.
+// The library's options, in its own words, with the source and where the
+// image goes (the file output_name when sink is null).
+struct qecfg_options : qecfg::options {
+    qecfg::source source;
     class image_sink *sink = nullptr;
 };
 
 class qecfg_context : public table_arena {
   public:
     explicit qecfg_context(qecfg_options opts)
-        : table_arena(table_trace{opts.debugLevel, opts.trace_out, opts.trace_err}), opt(std::move(opts)) {}
+        : table_arena(table_trace{opts.trace_level, opts.trace_out, opts.trace_err}), opt(std::move(opts)) {}
     ~qecfg_context();
 
     qecfg_options opt;

@@ -50,7 +50,7 @@ struct file_identity {
 };
 
 // The image is written to a file: a temporary one renamed over the output, or
-// the output itself in place where that cannot be done (see file_sink.cpp).
+// the output itself in place where that cannot be done (see qecfg_output.cpp).
 std::unique_ptr<image_sink> make_file_sink(const std::string &path, file_identity source);
 
 // The identity of an existing file, unknown when it cannot be found.

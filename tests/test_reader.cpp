@@ -103,8 +103,7 @@ TEST(Reader, UnterminatedLastLineIsRead) {
 TEST(Reader, LineNumbersPastTwoToTheThirtyOneArePrintedInFull) {
     // Reading 2^31 lines takes minutes; the count is started high instead.
     qecfg_options opt;
-    opt.source_in_memory = true;
-    opt.source_text = "\nBogus\n";
+    opt.source = qecfg::source::bytes("input.src", "\nBogus\n");
     qecfg_compiler c(opt);
     c.linenum = (uint64_t(1) << 31) + 1;
     std::string message;
