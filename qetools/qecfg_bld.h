@@ -72,8 +72,8 @@ class cdb_writer {
     std::unordered_map<std::string, uint32_t> var_class_index;
     std::unordered_map<uint32_t, tbl *> var_id_tbls;
     std::unordered_set<uint32_t> numeric_range_offsets; // in the image
-    char *chp = nullptr;                                 // the image's start
-    char *dsp = nullptr;                                 // where the next dsect's bytes go
+    char *chp = nullptr;                                // the image's start
+    char *dsp = nullptr;                                // where the next dsect's bytes go
     uint32_t dsect_count = 0, dsect_idx = 0;
     uint16_t hdr_max_class_id = 0, hdr_max_rm_id = 0;
     image_sink *sink = nullptr;

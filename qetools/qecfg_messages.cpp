@@ -26,11 +26,10 @@ constexpr message_row rows[] = {
     {missing_value, "missing-value", "Missing attribute value: %s", 1, LINE},
     {optional_before_required, "optional-before-required",
      "Optional attribute discovered before all required attributes have been defined%s", 1, LINE},
-    {duplicate_statement, "duplicate-statement", "Already defined. Duplicated definitions not allowed for %s", 1,
-     LINE},
+    {duplicate_statement, "duplicate-statement", "Already defined. Duplicated definitions not allowed for %s", 1, LINE},
     {no_strings_table, "no-strings-table", "No tbl for strings table", 1, LINE},
-    {no_valid_value_for_display_name, "no-valid-value-for-display-name",
-     "No ValidValue to attach ValueDisplayName to.", 1, LINE},
+    {no_valid_value_for_display_name, "no-valid-value-for-display-name", "No ValidValue to attach ValueDisplayName to.",
+     1, LINE},
     {variety_format, "variety-format", "Incorrect variety format", 1, LINE},
     {too_many_varieties, "too-many-varieties", "Too many varieties", 1, LINE},
     {invalid_data, "invalid-data", "str_to_zu: Invalid data", 1, LINE},
@@ -54,8 +53,7 @@ constexpr message_row rows[] = {
     {one_sd_per_kind, "one-sd-per-kind", "Only one SD definition of this kind allowed", 1, LINE},
     {no_class_for_persistent_attribute, "no-class-for-persistent-attribute", "No class for PersistentAttribute", 1,
      LINE},
-    {no_class_for_persistent_class_attribute, "no-class-for-persistent-class-attribute", "No class for pattr", 1,
-     LINE},
+    {no_class_for_persistent_class_attribute, "no-class-for-persistent-class-attribute", "No class for pattr", 1, LINE},
     {no_class_for_dynamic_attribute, "no-class-for-dynamic-attribute", "No class for DynamicAttribute", 1, LINE},
     {no_class_for_action, "no-class-for-action", "No class for class action", 1, LINE},
     {incomplete_stanza, "incomplete-stanza", "Previous stanza incomplete", 1, LINE},
@@ -69,11 +67,10 @@ constexpr message_row rows[] = {
     {range_high_not_built, "range-high-not-built", "copy_this_type default max range error (dattr)", 1, LINE},
     {structured_default_not_built, "structured-default-not-built", "dump_dflt: copy_this_sd_type default error", 1,
      LINE},
-    {structured_initial_not_built, "structured-initial-not-built", "dump_dflt: copy_this_sd_type init error", 1,
-     LINE},
+    {structured_initial_not_built, "structured-initial-not-built", "dump_dflt: copy_this_sd_type init error", 1, LINE},
     {place_structured, "place-structured", "copy_this_type: this function does not handle SD type", 1, NO_LINE},
-    {place_structured_array, "place-structured-array", "copy_this_type: this function does not handle SD ARRAY type",
-     1, NO_LINE},
+    {place_structured_array, "place-structured-array", "copy_this_type: this function does not handle SD ARRAY type", 1,
+     NO_LINE},
     {place_sbs, "place-sbs", "ZU_SBS_TYPE not supported", 1, NO_LINE},
     {place_empty_array, "place-empty-array", "Attempt to write NULL array", 1, NO_LINE},
     {place_structured_only, "place-structured-only", "copy_this_sd_type: only SD types allowed", 1, NO_LINE},
@@ -113,8 +110,7 @@ const std::vector<message_row> &messages() {
 
 const message_row &message(message_id id) { return rows[size_t(id)]; }
 
-std::string format_message(message_id id, std::uint64_t line, const std::vector<std::string> &subjects,
-                           bool newline) {
+std::string format_message(message_id id, std::uint64_t line, const std::vector<std::string> &subjects, bool newline) {
     const message_row &row = message(id);
     std::string out;
     if (row.line == line_source::statement && line != 0)

@@ -35,8 +35,8 @@ int str_to_zu(table_arena &a, zu_value_t *zu_out, zu_data_type_t zu_type, const 
 void set_props(uint32_t *dest, const props_t *props, int len, char *vnoq);
 
 // Placement. 0, or -1 for a type or code that cannot be placed.
-int copy_this_type(table_arena &a, value_slot out_data, const zu_value_t *in_data, zu_data_type_t type_in,
-                   int type_out, tbl *str_tbl, body_cursor *array_anchor, uint32_t array_cnt);
+int copy_this_type(table_arena &a, value_slot out_data, const zu_value_t *in_data, zu_data_type_t type_in, int type_out,
+                   tbl *str_tbl, body_cursor *array_anchor, uint32_t array_cnt);
 int copy_this_sd_type(table_arena &a, value_slot out_data, zu_data_type_t type_in, int type_out, tbl *str_tbl,
                       body_cursor *array_anchor, body_cursor *sd_array_anchor, body_cursor *sd_element_anchor,
                       uint32_t array_cnt, zu_data_type_t sd_type);

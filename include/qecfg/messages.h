@@ -112,8 +112,7 @@ const message_row &message(message_id id);
 
 // The text the command line prints: "LINE: " when the row has a line and it
 // is not 0, the text with its subjects, and a newline when asked for.
-std::string format_message(message_id id, std::uint64_t line, const std::vector<std::string> &subjects,
-                           bool newline);
+std::string format_message(message_id id, std::uint64_t line, const std::vector<std::string> &subjects, bool newline);
 
 } // namespace qecfg
 
