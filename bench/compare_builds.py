@@ -7,6 +7,7 @@ standard error and the output file's bytes must agree.
 
     bench/compare_builds.py OLD_QECFG NEW_QECFG [--generated N] [--jobs J]
 
+Sources that hold a NUL byte are left out (the reader refuses them now).
 Prints the counts, and the first differences; exit status 1 when any differ.
 """
 import argparse
@@ -191,7 +192,11 @@ def corpus_sources():
             for f in sorted(files):
                 if f.endswith(".src") or sub.startswith("fuzz"):
                     with open(os.path.join(dirpath, f), "rb") as fh:
-                        found.append((os.path.relpath(os.path.join(dirpath, f), ROOT), fh.read()))
+                        data = fh.read()
+                    # The compiler harness's inputs begin with its option byte.
+                    if sub == "fuzz/corpus/qecfg":
+                        data = data[1:]
+                    found.append((os.path.relpath(os.path.join(dirpath, f), ROOT), data))
     return found
 
 
@@ -236,6 +241,10 @@ def main():
         lines = Source(rnd).text()
         items.append(("generated/%d" % seed, ("\n".join(lines) + "\n").encode()))
         items.append(("mutated/%d" % seed, ("\n".join(mutate(rnd, lines)) + "\n").encode()))
+    # A NUL byte is refused on its line since the reader stopped cutting lines
+    # there silently: such sources are not compared.
+    with_nul = [name for name, src in items if b"\0" in src]
+    items = [item for item in items if b"\0" not in item[1]]
     scratch = tempfile.mkdtemp(prefix="qecfg-compare-")
     differing, compiled = [], 0
     try:
@@ -249,6 +258,8 @@ def main():
         shutil.rmtree(scratch, ignore_errors=True)
     print("sources: %d (compiled: %d, refused: %d), runs per binary: %d, differing runs: %d"
           % (len(items), compiled, len(items) - compiled, len(items) * len(MODES), len(differing)))
+    if with_nul:
+        print("not compared, holding a NUL byte: %d (%s)" % (len(with_nul), ", ".join(with_nul[:5])))
     kinds = {}
     for d in differing:
         kind = d.split(": ", 1)[1]

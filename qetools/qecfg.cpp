@@ -1,56 +1,154 @@
-// One compile: the sequence after the source has been read, the order in
-// which open records are completed, and the fatal exit.
+// One compile: the source's lines handed to the builders, the order in
+// which open records are completed, and the sequence after the source.
 #include <cerrno>
 #include <cstdlib>
 #include <new>
 
 #include "qecfg.h"
 #include "qecfg_sink.h"
+#include "qecfg_source.h"
 
 qecfg_context::~qecfg_context() {
     if (source_fp)
         std::fclose(source_fp);
-    for (tbl *t : owned_tbls)
-        std::free(t->tbl_base);
-    for (void *p : owned_blocks)
-        std::free(p);
 }
 
-void qecfg_context::raise_fatal(const char *msg, const char *v1, const char *v2, uint64_t line, int code) {
-    if (source_fp) {
-        std::fclose(source_fp);
-        source_fp = nullptr;
+void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects, int err) {
+    int status = qecfg::message(id).status;
+    throw qecfg_fatal{id, line, std::vector<std::string>(subjects.begin(), subjects.end()), status ? status : err};
+}
+
+qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {}
+
+
+namespace {
+
+// The required-before-optional and duplicate rules. The given rows change
+// before the value is converted; a value then refused ends the compile.
+void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyword_row &row, const char *name) {
+    if (row.optional) {
+        if (given.required != stanza_defs[stanza].required_mask)
+            c.statement_error(msg::optional_before_required, {name});
+        if ((given.optional & row.bit) && !row.repeatable)
+            c.statement_error(msg::duplicate_statement, {name});
+        given.optional |= row.bit;
+        return;
     }
-    std::string text;
-    if (msg) {
-        if (line != 0)
-            text = std::to_string(line) + ": ";
-        text += msg;
-        text += v1 ? v1 : "";
-        text += v2 ? v2 : "";
-        if (opt.newline_after_message)
-            text += "\n";
+    if ((given.required & row.bit) && !row.repeatable)
+        c.statement_error(msg::duplicate_statement, {name});
+    given.required |= row.bit;
+    if (c.opt.trace_level > 1)
+        QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
+}
+
+} // namespace
+
+void qecfg_compiler::read_source(const char *filename) {
+    source_fp = opt.source.in_memory ? open_memory_source(opt.source.text) : std::fopen(filename, "r");
+    if (!source_fp) {
+        int e = errno;
+        raise_fatal(msg::cannot_open, 0, {filename, std::strerror(e)}, e);
     }
-    throw qecfg_fatal{text, code};
+    source_reader reader(source_fp, linenum);
+    source_line line;
+    while (reader.next(line)) {
+        linenum = line.line;
+        if (line.header)
+            read_header(line);
+        else
+            read_statement(line);
+    }
+    linenum = reader.last_line();
+    const source_stop &stop = reader.stop();
+    if (stop.id == msg::cannot_read)
+        raise_fatal(stop.id, 0, {filename, std::strerror(stop.err)}, stop.err);
+    if (stop.id != msg::none)
+        raise_fatal(stop.id, stop.line);
+    std::fclose(source_fp);
+    source_fp = nullptr;
 }
 
-void qecfg_context::statement_error(const char *msg, const char *v1, const char *v2) {
-    raise_fatal(msg, v1, v2, linenum, 1);
+stanza_builder &qecfg_compiler::builder_of(int t) {
+    switch (t) {
+    case ST_CONTROL_DEFINITION:
+    case ST_RESOURCE_CLASS: return cls;
+    case ST_CLASS_TO_MANAGER_MAPPING: return map;
+    case ST_RESOURCE_VARIABLE_CLASS: return vclass;
+    case ST_CLASS_ACTION: return actions[0];
+    case ST_RESOURCE_ACTION: return actions[1];
+    default: return is_sd_stanza(t) ? static_cast<stanza_builder &>(sd) : attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+    }
 }
 
-qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {
-    for (int i = 0; i < NUM_STANZA_TYPES; i++)
-        for (int r = 0; r < stanza_defs[i].num_rows; r++)
-            row_name_len[i][r] = std::strlen(stanza_defs[i].rows[r].name);
+// A header completes the open structured-data run and the open actions,
+// then starts its own builder, which completes the open record of its kind.
+// Records of other kinds stay open until the next stanza of their kind or
+// the end of the source.
+void qecfg_compiler::read_header(const source_line &header) {
+    int t = header.stanza;
+    if (t < 0)
+        statement_error(msg::invalid_stanza, {header.name});
+    prev_stanza = stanza;
+    stanza = t;
+    if (is_sd_stanza(t)) {
+        sd.start_stanza(t, prev_stanza);
+        sd.given = given_rows{};
+        return;
+    }
+    if (sd.pending())
+        sd.complete();
+    complete_open_actions();
+    start_stanza(t);
+    builder_of(t).given = given_rows{};
+    sd.link_attribute(nullptr);
 }
 
-qecfg_compiler::~qecfg_compiler() {
-    release_output();
-    for (record_table *r : {&classes, &maps, &managers, &var_classes})
-        std::free(r->t.tbl_base);
-    // The lists of the builders are tables of their own.
-    for (attr_builder &a : attrs)
-        a.release_lists();
+void qecfg_compiler::start_stanza(int t) {
+    switch (t) {
+    case ST_CONTROL_DEFINITION:
+        if (cls.open())
+            complete_class();
+        cls.start();
+        break;
+    case ST_RESOURCE_CLASS: break; // fills the class its ControlDefinition opened
+    case ST_CLASS_TO_MANAGER_MAPPING: map.start(); break;
+    case ST_RESOURCE_VARIABLE_CLASS: vclass.start(); break;
+    case ST_CLASS_ACTION: actions[0].start(); break;
+    case ST_RESOURCE_ACTION: actions[1].start(); break;
+    default: attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE].start(); break;
+    }
+}
+
+void qecfg_compiler::complete_open_actions() {
+    for (action_builder *a : {&actions[1], &actions[0]})
+        if (a->open())
+            a->complete();
+}
+
+void qecfg_compiler::read_statement(const source_line &s) {
+    if (s.skipped)
+        return;
+    if (s.problem != msg::none)
+        statement_error(s.problem, {s.name});
+    const stanza_def &def = stanza_defs[stanza];
+    if (!s.row)
+        statement_error(msg::unknown_keyword, {s.name, def.name});
+    if (s.value_length == 0) {
+        QECFG_TRACE(*this, "In file %s: ", opt.source.name.c_str());
+        statement_error(msg::missing_value, {s.name});
+    }
+    if (opt.trace_level > 1)
+        QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, s.name, s.value,
+                    int(s.value_length));
+    stanza_builder &b = builder_of(stanza);
+    apply_row_rules(*this, b.given, stanza, *s.row, s.name);
+    b.store_statement(*s.row, s.value);
+    // A structured attribute owns the definition of the run that follows.
+    if (s.row->what == statement::data_type) {
+        attr_builder &a = attrs[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
+        if (zu_is_sd_type(a.data_type()))
+            sd.link_attribute(&a);
+    }
 }
 
 // Everything still open at the end of the source. Each completion appends
@@ -89,7 +187,7 @@ void qecfg_compiler::complete_class() {
 // The map's ResourceManager statement is the only source of the manager.
 void qecfg_compiler::build_manager() {
     if (!map.manager_given)
-        raise_fatal("No ResourceManager defined for the class-to-manager map", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_manager, 0);
     rsrc_mgr_t m{};
     m.rm_cb_ID = RSRC_MGR_ID;
     tbl *strings = new_tbl("ManagerStrings", 8192);
@@ -104,23 +202,27 @@ void qecfg_compiler::run() {
         compile();
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
-        release_output();
-        raise_fatal("cfg_malloc malloc failure: ", std::strerror(ENOMEM), nullptr, 0, ENOMEM);
+        raise_fatal(msg::out_of_memory, 0, {std::strerror(ENOMEM)}, ENOMEM);
     }
 }
 
 void qecfg_compiler::compile() {
-    read_source(opt.cdefsrc.c_str());
+    read_source(opt.source.name.c_str());
     finish_open_records();
     if (!cls.open())
-        raise_fatal("No classes defined", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_classes, 0);
     complete_class();
     if (vclass.open())
         vclass.complete();
     if (!map.open())
-        raise_fatal("No class-to-manager maps defined", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::no_maps, 0);
     map.complete();
     build_manager();
-    bld_var_id_tbls();
-    bld_cdb();
+    cdb_writer writer(*this, output_target(), opt.reverse_byte_order);
+    writer.write(compiled_records{classes, maps, managers, var_classes, vclass.named, numeric_ranges});
+}
+
+image_target qecfg_compiler::output_target() const {
+    return image_target{opt.sink, opt.output_name,
+                        opt.source.in_memory ? file_identity{} : identity_of(opt.source.name)};
 }

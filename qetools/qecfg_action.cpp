@@ -8,7 +8,7 @@ void action_builder::start() {
     if (open())
         complete();
     if (!owner.open())
-        c.statement_error("No class for class action");
+        c.statement_error(msg::no_class_for_action);
     rec = rsrc_action_t{};
     rec.ac_cb_ID = stanza == ST_CLASS_ACTION ? RSRC_ACTION_CLASS_ID : RSRC_ACTION_RSRC_ID;
     rec.u_ac_variety_list.offset[0] =
@@ -20,7 +20,7 @@ void action_builder::start() {
 
 void action_builder::complete() {
     if (given.required != stanza_defs[stanza].required_mask)
-        c.statement_error("Previous stanza incomplete");
+        c.statement_error(msg::incomplete_stanza);
     if (!given.has(row_named(stanza, kw::Permission)))
         rec.ac_perms = CDB_DEFAULT_PERMISSION;
     tbl *table = class_table(stanza == ST_CLASS_ACTION ? &rsrc_class_t::u_rc_actionsC : &rsrc_class_t::u_rc_actions);

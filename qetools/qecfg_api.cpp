@@ -10,24 +10,19 @@ namespace {
 
 qecfg_options compile_options(const qecfg::source &src, const qecfg::options &o, const std::string &output_name) {
     qecfg_options opt;
-    opt.newline_after_message = o.message_newline;
-    opt.debugLevel = o.trace_level;
-    opt.swap_endianness = o.reverse_byte_order;
-    opt.cdefsrc = src.name;
-    opt.cdefname = output_name;
-    opt.trace_out = o.trace_out;
-    opt.trace_err = o.trace_err;
-    opt.source_in_memory = src.in_memory;
-    opt.source_text = src.text;
+    static_cast<qecfg::options &>(opt) = o;
+    opt.output_name = output_name;
+    opt.source = src;
     return opt;
 }
 
 qecfg::result run(qecfg_options opt) {
+    bool newline = opt.message_newline;
     try {
         qecfg_compiler c(std::move(opt));
         c.run();
     } catch (const qecfg_fatal &f) {
-        return qecfg::result{f.code, f.message};
+        return qecfg::result{f.status, f.text(newline), f.id, qecfg::message(f.id).name, f.line};
     }
     return {};
 }
@@ -49,7 +44,7 @@ qecfg::result qecfg::compile_to_memory(const source &src, std::vector<std::uint8
 
 qecfg::result qecfg::compile_to_file(const source &src, const std::string &output_path, const options &o) {
     qecfg_options opt = compile_options(src, o, o.output_name.empty() ? output_path : o.output_name);
-    std::unique_ptr<file_output> sink =
+    std::unique_ptr<image_sink> sink =
         make_file_sink(output_path, src.in_memory ? file_identity{} : identity_of(src.name), !o.skip_disk_flush);
     // The output is checked where the image is first asked for, after the
     // source compiled: an error of the source is reported before one of the

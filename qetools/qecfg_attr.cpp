@@ -8,15 +8,15 @@ namespace {
 struct attr_kind {
     uint32_t id;
     cdb_ref_t rsrc_class_t::*table;
-    const char *no_class_msg;
+    msg no_class;
 };
 
 // By stanza type, from PersistentResourceAttribute on.
 const attr_kind attr_kinds[] = {
-    {RSRC_PATTR_RSRC_ID, &rsrc_class_t::u_rc_pattrs, "No class for PersistentAttribute"},
-    {RSRC_PATTR_CLASS_ID, &rsrc_class_t::u_rc_pattrsC, "No class for pattr"},
-    {RSRC_DATTR_RSRC_ID, &rsrc_class_t::u_rc_dattrs, "No class for DynamicAttribute"},
-    {RSRC_DATTR_CLASS_ID, &rsrc_class_t::u_rc_dattrsC, "No class for DynamicAttribute"},
+    {RSRC_PATTR_RSRC_ID, &rsrc_class_t::u_rc_pattrs, msg::no_class_for_persistent_attribute},
+    {RSRC_PATTR_CLASS_ID, &rsrc_class_t::u_rc_pattrsC, msg::no_class_for_persistent_class_attribute},
+    {RSRC_DATTR_RSRC_ID, &rsrc_class_t::u_rc_dattrs, msg::no_class_for_dynamic_attribute},
+    {RSRC_DATTR_CLASS_ID, &rsrc_class_t::u_rc_dattrsC, msg::no_class_for_dynamic_attribute},
 };
 
 const attr_kind &kind_of(int stanza) { return attr_kinds[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE]; }
@@ -65,7 +65,7 @@ void attr_builder::start() {
     if (open())
         complete();
     if (!owner.open())
-        c.statement_error(kind_of(stanza).no_class_msg);
+        c.statement_error(kind_of(stanza).no_class);
     if (dynamic_) {
         rec.d = rsrc_dattr_t{};
         rec.d.ra_cb_ID = kind_of(stanza).id;
@@ -83,12 +83,9 @@ void attr_builder::start() {
     }
     vvdisp_tbl = nullptr;
     valid_values_started = range_given = false;
-    release_lists(); // those of the previous attribute are spent
-}
-
-void attr_builder::release_lists() {
-    c.release_storage(&values.t);
-    c.release_storage(&element_types.t);
+    // The lists of the previous attribute are spent.
+    values.t.release();
+    element_types.t.release();
 }
 
 void attr_builder::store_statement(const keyword_row &row, char *v) {
@@ -101,7 +98,7 @@ void attr_builder::store_statement(const keyword_row &row, char *v) {
     case statement::variable_type: {
         qel_variable_type_t t = QEL_COUNTER;
         if (strToVar(v, &t) != 0)
-            c.statement_error("Invalid variable type");
+            c.statement_error(msg::invalid_variable_type);
         store<uint32_t>(target, t);
         break;
     }
@@ -123,11 +120,11 @@ void attr_builder::store_valid_value_statement(char *target, char *v) {
 void attr_builder::store_default(const char *v) {
     zu_data_type_t dt = data_type();
     if (zu_is_sd_type(dt))
-        c.statement_error("Default values not expected; place default values in individual *SDDef stanzas.");
+        c.statement_error(msg::default_for_structured);
     char *slot = values.take(c);
     zu_value_t val{};
-    if (c.str_to_zu(&val, dt, v) != 0)
-        c.statement_error("str_to_zu: Invalid data");
+    if (str_to_zu(c, &val, dt, v) != 0)
+        c.statement_error(msg::invalid_data);
     store(slot, val);
 }
 
@@ -135,7 +132,7 @@ void attr_builder::store_data_type(char *target, const char *v) {
     zu_data_type_t dt = strToZuDt(v);
     store<uint32_t>(target, dt);
     if (dt == ZU_UNKNOWN)
-        c.statement_error("Invalid data type");
+        c.statement_error(msg::invalid_data_type);
     // A structured attribute collects the element types of the run that
     // must follow, in a list named after its type.
     if (zu_is_sd_type(dt))
@@ -148,7 +145,7 @@ void attr_builder::store_range(char *target, char *v) {
         return;
     range_given = true;
     if (!std::strchr(v, ','))
-        c.statement_error("Range requires two values");
+        c.statement_error(msg::range_needs_two_values);
     place_pair(dt, v, value_slot::at(target), value_slot::at(target + sizeof(zu_value_t)));
 }
 
@@ -162,10 +159,9 @@ void attr_builder::build_structured_value() {
     int code = dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT;
     for (uint32_t i = 0; i < n; i++) {
         array = body_cursor{};
-        if (c.copy_this_sd_type(value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
+        if (copy_this_sd_type(c, value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
                                 data_type()) != 0)
-            c.statement_error(dynamic_ ? "dump_dflt: copy_this_sd_type init error"
-                                       : "dump_dflt: copy_this_sd_type default error");
+            c.statement_error(dynamic_ ? msg::structured_initial_not_built : msg::structured_default_not_built);
     }
 }
 
@@ -175,7 +171,7 @@ void attr_builder::complete() {
             QECFG_TRACE(c, "scp->req_mask:         %x\n", given.required);
             QECFG_TRACE(c, "scp->req_mask_cmplt:   %x\n", stanza_defs[stanza].required_mask);
         }
-        c.statement_error("Previous stanza incomplete");
+        c.statement_error(msg::incomplete_stanza);
     }
     if (!valid_values_started)
         set_none(field(offsetof(rsrc_pattr_t, u_ra_valid_vals), offsetof(rsrc_dattr_t, u_ra_valid_vals)));
@@ -206,15 +202,14 @@ void attr_builder::complete_value() {
         body_cursor array;
         for (uint32_t i = 0; i < n; i++) {
             zu_value_t v = values.at(i);
-            if (c.copy_this_type(value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
-                c.statement_error("dump_dflt: copy_this_type error");
+            if (copy_this_type(c, value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
+                c.statement_error(msg::default_not_placed);
         }
         return;
     }
     body_cursor a;
-    if (c.copy_this_type(value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
-        c.statement_error(dynamic_ ? "copy_this_type default value error (dattr)"
-                                   : "copy_this_type default value error");
+    if (copy_this_type(c, value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
+        c.statement_error(dynamic_ ? msg::initial_value_not_built : msg::default_value_not_built);
 }
 
 // The range of a dynamic attribute: none for the reference types, the
@@ -242,18 +237,18 @@ void attr_builder::complete_range() {
         }
         if (dt == ZU_SD_PTR_ARRAY) {
             body_cursor a[3];
-            if (c.copy_this_sd_type(lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                c.statement_error("copy_this_type default min range error (dattr)");
+            if (copy_this_sd_type(c, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
+                c.statement_error(msg::range_low_not_built);
             body_cursor b[3];
-            if (c.copy_this_sd_type(hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                c.statement_error("copy_this_type default max range error (dattr)");
+            if (copy_this_sd_type(c, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
+                c.statement_error(msg::range_high_not_built);
         } else {
             body_cursor a;
-            if (c.copy_this_type(lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
-                c.statement_error("copy_this_type default min range error (dattr)");
+            if (copy_this_type(c, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
+                c.statement_error(msg::range_low_not_built);
             body_cursor b;
-            if (c.copy_this_type(hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
-                c.statement_error("copy_this_type default max range error (dattr)");
+            if (copy_this_type(c, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
+                c.statement_error(msg::range_high_not_built);
         }
     }
     range_given = false;

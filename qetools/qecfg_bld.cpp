@@ -1,13 +1,12 @@
-// The CDB builder: exact size, the image taken from the sink, the header,
-// anchors and dsects laid into it, the checksum, and the
-// variable ID tables that group dynamic attributes by variable class.
+// The image writer: the variable ID tables, the exact size, the image taken
+// from the sink, the header, anchors and dsects laid into it, the checksum.
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
 #include <sys/time.h>
 
-#include "qecfg.h"
-#include "qecfg_sink.h"
+#include "qecfg_bld.h"
+#include "qecfg_swap.h"
 
 namespace {
 
@@ -26,10 +25,10 @@ tbl *ref_tbl(const char *rec, size_t field) { return ref_table(load<cdb_ref_t>(r
 // ---------------------------------------------------------------------------
 // Variable ID tables.
 
-void qecfg_compiler::bld_var_id_tbls() {
-    size_t n = tbl_used(&classes.t) / sizeof(rsrc_class_t);
+void cdb_writer::bld_var_id_tbls() {
+    size_t n = tbl_used(&in->classes.t) / sizeof(rsrc_class_t);
     for (size_t i = 0; i < n; i++) {
-        const char *rc = classes.t.tbl_base + i * sizeof(rsrc_class_t);
+        const char *rc = in->classes.t.tbl_base + i * sizeof(rsrc_class_t);
         const tbl *strings = ref_tbl(rc, offsetof(rsrc_class_t, u_rc_strings));
         const std::pair<size_t, uint32_t> kinds[] = {{offsetof(rsrc_class_t, u_rc_dattrsC), CDB_CLASS_VAR_ID_BIT},
                                                      {offsetof(rsrc_class_t, u_rc_dattrs), 0}};
@@ -50,14 +49,14 @@ void qecfg_compiler::bld_var_id_tbls() {
     }
 }
 
-void qecfg_compiler::add_varID_to_var_class(const char *srch_name, uint32_t varID) {
+void cdb_writer::add_varID_to_var_class(const char *srch_name, uint32_t varID) {
     if (var_class_index.empty()) {
         // The first variable class of a name wins; unnamed ones match nothing.
-        size_t n = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
+        size_t n = tbl_used(&in->var_classes.t) / sizeof(rsrc_variable_class_t);
         for (size_t i = 0; i < n; i++) {
-            const char *rec = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
+            const char *rec = in->var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
             const tbl *strings = ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
-            const char *name = vclass.named[i] ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
+            const char *name = in->var_class_named[i] ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
                                             : nullptr;
             if (name)
                 var_class_index.emplace(name, uint32_t(i * sizeof(rsrc_variable_class_t)));
@@ -67,19 +66,19 @@ void qecfg_compiler::add_varID_to_var_class(const char *srch_name, uint32_t varI
     auto it = var_class_index.find(srch_name);
     if (it == var_class_index.end() || it->second == CDB_NONE)
         return;
-    char *rec = var_classes.t.tbl_base + it->second;
+    char *rec = in->var_classes.t.tbl_base + it->second;
     tbl *ids = find_tbl_entry(rec);
     if (!ids) {
-        ids = new_tbl("VariableIDs", 64);
+        ids = arena.new_tbl("VariableIDs", 64);
         var_id_tbls.emplace(it->second, ids);
     }
-    store<uint32_t>(alloc_tble(ids, sizeof varID), varID);
+    store<uint32_t>(arena.alloc_tble(ids, sizeof varID), varID);
     char *count = rec + offsetof(rsrc_variable_class_t, rvc_var_count);
     store<uint32_t>(count, load<uint32_t>(count) + 1);
 }
 
-tbl *qecfg_compiler::find_tbl_entry(const void *rvcp) const {
-    auto key = uint32_t(static_cast<const char *>(rvcp) - var_classes.t.tbl_base);
+tbl *cdb_writer::find_tbl_entry(const void *rvcp) const {
+    auto key = uint32_t(static_cast<const char *>(rvcp) - in->var_classes.t.tbl_base);
     auto it = var_id_tbls.find(key);
     return it == var_id_tbls.end() ? nullptr : it->second;
 }
@@ -87,40 +86,40 @@ tbl *qecfg_compiler::find_tbl_entry(const void *rvcp) const {
 // ---------------------------------------------------------------------------
 // Size.
 
-size_t qecfg_compiler::cdb_size() {
-    uint32_t dsect_count = maps.count + managers.count + var_classes.count + classes.count;
+size_t cdb_writer::cdb_size() {
+    uint32_t dsect_count = in->maps.count + in->managers.count + in->var_classes.count + in->classes.count;
     uint64_t size = CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * uint64_t(dsect_count);
-    size_t nvc = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
+    size_t nvc = tbl_used(&in->var_classes.t) / sizeof(rsrc_variable_class_t);
     for (size_t i = 0; i < nvc; i++) {
-        const char *rec = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
+        const char *rec = in->var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         uint32_t count = load<uint32_t>(rec + offsetof(rsrc_variable_class_t, rvc_var_count));
         size += sizeof(rsrc_variable_class_t) + round8(tbl_used(ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl)))) +
                 round8(4 * size_t(count));
     }
-    size_t nmap = tbl_used(&maps.t) / sizeof(rsrc_cmmap_t);
+    size_t nmap = tbl_used(&in->maps.t) / sizeof(rsrc_cmmap_t);
     for (size_t i = 0; i < nmap; i++)
         size += sizeof(rsrc_cmmap_t) +
-                round8(tbl_used(ref_tbl(maps.t.tbl_base + i * sizeof(rsrc_cmmap_t), offsetof(rsrc_cmmap_t, u_rcm_strings))));
-    size_t nmgr = tbl_used(&managers.t) / sizeof(rsrc_mgr_t);
+                round8(tbl_used(ref_tbl(in->maps.t.tbl_base + i * sizeof(rsrc_cmmap_t), offsetof(rsrc_cmmap_t, u_rcm_strings))));
+    size_t nmgr = tbl_used(&in->managers.t) / sizeof(rsrc_mgr_t);
     for (size_t i = 0; i < nmgr; i++)
         size += sizeof(rsrc_mgr_t) +
-                round8(tbl_used(ref_tbl(managers.t.tbl_base + i * sizeof(rsrc_mgr_t), offsetof(rsrc_mgr_t, u_rm_strings_table))));
-    size_t ncl = tbl_used(&classes.t) / sizeof(rsrc_class_t);
+                round8(tbl_used(ref_tbl(in->managers.t.tbl_base + i * sizeof(rsrc_mgr_t), offsetof(rsrc_mgr_t, u_rm_strings_table))));
+    size_t ncl = tbl_used(&in->classes.t) / sizeof(rsrc_class_t);
     for (size_t i = 0; i < ncl; i++)
-        size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(classes.t.tbl_base + i * sizeof(rsrc_class_t)));
+        size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(in->classes.t.tbl_base + i * sizeof(rsrc_class_t)));
     if (size >= MAX_IMAGE)
-        raise_output_fatal("CDB image exceeds 4 GiB", nullptr, nullptr, 1);
+        raise_fatal(msg::image_too_large, 0);
     return size_t(size);
 }
 
 // Stores the counts and table sizes into the class record and returns the
 // length of its dsect.
-uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
+uint64_t cdb_writer::class_dsect_size(rsrc_class_t *rc) {
     auto records = [&](const cdb_ref_t &ref, size_t rec_size) -> uint16_t {
         const tbl *t = static_cast<const tbl *>(ref.ptr);
         size_t n = tbl_used(t) / rec_size;
         if (n > MAX_TABLE_RECORDS)
-            raise_output_fatal("Too many records in table: ", t->tbl_name, nullptr, 1);
+            raise_fatal(msg::too_many_records, 0, {t->tbl_name});
         return uint16_t(n);
     };
     auto bytes = [](const cdb_ref_t &ref) { return tbl_used(static_cast<const tbl *>(ref.ptr)); };
@@ -143,32 +142,28 @@ uint64_t qecfg_compiler::class_dsect_size(rsrc_class_t *rc) {
 // ---------------------------------------------------------------------------
 // The output file.
 
-void qecfg_compiler::raise_output_fatal(const char *msg, const char *v1, const char *v2, int code) {
-    release_output();
-    std::string text;
-    if (msg) {
-        text = std::string(msg) + (v1 ? v1 : "") + (v2 ? v2 : "");
-        if (opt.newline_after_message)
-            text += "\n";
-    }
-    throw qecfg_fatal{text, code};
-}
+cdb_writer::cdb_writer(table_arena &arena, image_target target, bool reverse_byte_order)
+    : arena(arena), target(std::move(target)), reverse(reverse_byte_order) {}
 
-// A failed build leaves nothing of its image behind.
-void qecfg_compiler::release_output() {
+// A failed write leaves nothing of its image behind.
+cdb_writer::~cdb_writer() {
     if (image_pending)
         sink->abandon();
-    image_pending = false;
 }
 
-[[noreturn]] void qecfg_compiler::output_failed(const sink_failure &f) {
-    raise_output_fatal(f.prefix, f.text ? f.text : std::strerror(f.err), nullptr, 1);
+// The sink names its failure by the text its message begins with.
+[[noreturn]] void cdb_writer::output_failed(const sink_failure &f) {
+    msg id = msg::cannot_write;
+    for (msg m : {msg::cannot_create, msg::cannot_extend, msg::cannot_map, msg::cannot_write})
+        if (std::string(qecfg::message(m).text) == std::string(f.prefix) + "%s")
+            id = m;
+    raise_fatal(id, 0, {f.text ? f.text : std::strerror(f.err)});
 }
 
-char *qecfg_compiler::acquire_image(size_t cdb_file_size) {
-    sink = opt.sink;
+char *cdb_writer::acquire_image(size_t cdb_file_size) {
+    sink = target.given;
     if (!sink) {
-        own_sink = make_file_sink(opt.cdefname, opt.source_in_memory ? file_identity{} : identity_of(opt.cdefsrc));
+        own_sink = make_file_sink(target.path, target.source);
         sink = own_sink.get();
     }
     image_pending = true;
@@ -182,19 +177,19 @@ char *qecfg_compiler::acquire_image(size_t cdb_file_size) {
 // ---------------------------------------------------------------------------
 // Dsects.
 
-void qecfg_compiler::begin_dsect(cdb_dsect_type_t type) {
+void cdb_writer::begin_dsect(cdb_dsect_type_t type) {
     cdb_dsect_anchor_t a{type, uint32_t(dsp - chp), 0, 0};
     std::memcpy(chp + CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * dsect_idx, &a, sizeof a);
 }
 
-void qecfg_compiler::grow_dsect(size_t len) {
+void cdb_writer::grow_dsect(size_t len) {
     char *a = chp + CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * dsect_idx + offsetof(cdb_dsect_anchor_t, cda_length);
     store<uint32_t>(a, load<uint32_t>(a) + uint32_t(len));
     dsp += len;
 }
 
 // Starts the dsect of one record: its anchor, then the record itself.
-char *qecfg_compiler::copy_record(cdb_dsect_type_t type, const char *src, size_t size) {
+char *cdb_writer::copy_record(cdb_dsect_type_t type, const char *src, size_t size) {
     begin_dsect(type);
     char *rec = dsp;
     std::memcpy(rec, src, size);
@@ -203,7 +198,7 @@ char *qecfg_compiler::copy_record(cdb_dsect_type_t type, const char *src, size_t
 }
 
 // Copies a table behind the record and points the record's reference at it.
-void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounded) {
+void cdb_writer::copy_table(char *rec, size_t ref_field, tbl *t, bool rounded) {
     cdb_ref_t ref{};
     ref.offset[0] = uint32_t(dsp - rec);
     std::memcpy(rec + ref_field, &ref, sizeof ref);
@@ -213,13 +208,14 @@ void qecfg_compiler::copy_table(char *rec, size_t ref_field, tbl *t, bool rounde
     else if (len)
         std::memcpy(dsp, t->tbl_base, len);
     grow_dsect(rounded ? round8(len) : len);
-    release_storage(t);
+    if (t)
+        t->release();
 }
 
-void qecfg_compiler::add_rsrc_class_tbls() {
-    size_t n = tbl_used(&classes.t) / sizeof(rsrc_class_t);
+void cdb_writer::add_rsrc_class_tbls() {
+    size_t n = tbl_used(&in->classes.t) / sizeof(rsrc_class_t);
     if (!n)
-        raise_output_fatal("No Rsrc Class Tables found", nullptr, nullptr, 1);
+        raise_fatal(msg::no_class_dsects, 0);
     static const size_t copied[] = {
         offsetof(rsrc_class_t, u_rc_pattrsC),  offsetof(rsrc_class_t, u_rc_dattrsC),
         offsetof(rsrc_class_t, u_rc_pattrs),   offsetof(rsrc_class_t, u_rc_dattrs),
@@ -228,7 +224,7 @@ void qecfg_compiler::add_rsrc_class_tbls() {
         offsetof(rsrc_class_t, u_rc_valid_vals),
     };
     for (size_t i = 0; i < n; i++) {
-        const char *src = classes.t.tbl_base + i * sizeof(rsrc_class_t);
+        const char *src = in->classes.t.tbl_base + i * sizeof(rsrc_class_t);
         char *rec = copy_record(CDB_DSECT_CLASS, src, sizeof(rsrc_class_t));
         for (size_t field : copied) {
             tbl *t = ref_tbl(src, field);
@@ -248,19 +244,19 @@ void qecfg_compiler::add_rsrc_class_tbls() {
 }
 
 // Records, by file offset, the dynamic attributes whose range holds numbers.
-void qecfg_compiler::note_numeric_ranges(const tbl *t) {
+void cdb_writer::note_numeric_ranges(const tbl *t) {
     size_t n = tbl_used(t) / sizeof(rsrc_dattr_t);
     for (size_t j = 0; j < n; j++)
-        if (numeric_ranges.count({t, j * sizeof(rsrc_dattr_t)}))
+        if (in->numeric_ranges.count({t, j * sizeof(rsrc_dattr_t)}))
             numeric_range_offsets.insert(uint32_t(dsp - chp + j * sizeof(rsrc_dattr_t)));
 }
 
-void qecfg_compiler::add_rsrc_mgr_tbls() {
-    size_t n = tbl_used(&managers.t) / sizeof(rsrc_mgr_t);
+void cdb_writer::add_rsrc_mgr_tbls() {
+    size_t n = tbl_used(&in->managers.t) / sizeof(rsrc_mgr_t);
     if (!n)
-        raise_output_fatal("No Rsrc Manager tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_manager_dsects, 0);
     for (size_t i = 0; i < n; i++) {
-        const char *src = managers.t.tbl_base + i * sizeof(rsrc_mgr_t);
+        const char *src = in->managers.t.tbl_base + i * sizeof(rsrc_mgr_t);
         char *rec = copy_record(CDB_DSECT_RSRC_MGR, src, sizeof(rsrc_mgr_t));
         copy_table(rec, offsetof(rsrc_mgr_t, u_rm_strings_table), ref_tbl(src, offsetof(rsrc_mgr_t, u_rm_strings_table)),
                    true);
@@ -274,30 +270,31 @@ void qecfg_compiler::add_rsrc_mgr_tbls() {
     }
 }
 
-void qecfg_compiler::add_rsrc_cmmap_tbls() {
-    size_t n = tbl_used(&maps.t) / sizeof(rsrc_cmmap_t);
+void cdb_writer::add_rsrc_cmmap_tbls() {
+    size_t n = tbl_used(&in->maps.t) / sizeof(rsrc_cmmap_t);
     if (!n)
-        raise_output_fatal("No Rsrc CMMAP tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_map_dsects, 0);
     for (size_t i = 0; i < n; i++) {
-        const char *src = maps.t.tbl_base + i * sizeof(rsrc_cmmap_t);
+        const char *src = in->maps.t.tbl_base + i * sizeof(rsrc_cmmap_t);
         char *rec = copy_record(CDB_DSECT_CMMAP, src, sizeof(rsrc_cmmap_t));
         copy_table(rec, offsetof(rsrc_cmmap_t, u_rcm_strings), ref_tbl(src, offsetof(rsrc_cmmap_t, u_rcm_strings)), true);
         dsect_idx++;
     }
 }
 
-void qecfg_compiler::add_rsrc_var_class_tbls() {
-    size_t n = tbl_used(&var_classes.t) / sizeof(rsrc_variable_class_t);
+void cdb_writer::add_rsrc_var_class_tbls() {
+    size_t n = tbl_used(&in->var_classes.t) / sizeof(rsrc_variable_class_t);
     if (!n)
-        raise_output_fatal("No Rsrc Variable Class tables", nullptr, nullptr, 1);
+        raise_fatal(msg::no_variable_class_dsects, 0);
     for (size_t i = 0; i < n; i++) {
-        const char *src = var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
+        const char *src = in->var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         char *rec = copy_record(CDB_DSECT_VAR_CLASS, src, sizeof(rsrc_variable_class_t));
         tbl *strings = ref_tbl(src, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
         size_t len = tbl_used(strings);
         memcpy_8_rounded(dsp, strings ? strings->tbl_base : nullptr, len);
         grow_dsect(round8(len));
-        release_storage(strings);
+        if (strings)
+            strings->release();
         // The reference holds the rounded string length: the IDs follow.
         cdb_ref_t ref{};
         ref.offset[0] = uint32_t(round8(len));
@@ -305,7 +302,7 @@ void qecfg_compiler::add_rsrc_var_class_tbls() {
         if (tbl *ids = find_tbl_entry(src)) {
             memcpy_8_rounded(dsp, ids->tbl_base, tbl_used(ids));
             grow_dsect(round8(tbl_used(ids)));
-            release_storage(ids);
+            ids->release();
         }
         dsect_idx++;
     }
@@ -327,8 +324,10 @@ static qel_timeval32_t build_time() {
     return {uint32_t(tv.tv_sec), uint32_t(tv.tv_usec)};
 }
 
-void qecfg_compiler::bld_cdb() {
-    dsect_count = maps.count + managers.count + var_classes.count + classes.count;
+void cdb_writer::write(const compiled_records &records) {
+    in = &records;
+    bld_var_id_tbls();
+    dsect_count = in->maps.count + in->managers.count + in->var_classes.count + in->classes.count;
     size_t size = cdb_size();
     chp = acquire_image(size);
     dsect_idx = 0;
@@ -337,9 +336,13 @@ void qecfg_compiler::bld_cdb() {
     add_rsrc_class_tbls();
     add_rsrc_mgr_tbls();
     add_rsrc_cmmap_tbls();
-    if (var_classes.t.tbl_base)
+    if (in->var_classes.t.tbl_base)
         add_rsrc_var_class_tbls();
+    write_header();
+    commit_image();
+}
 
+void cdb_writer::write_header() {
     qel_cdb_header_t h{};
     h.cdb_hdr_length = uint32_t(dsp - chp) - 4;
     h.cdb_hdr_format = CDB_FORMAT;
@@ -359,12 +362,11 @@ void qecfg_compiler::bld_cdb() {
     std::memcpy(chp, &h, sizeof h);
     uint32_t sum = cdb_checksum(h.cdb_hdr_length, [&](size_t off) { return load<uint32_t>(chp + off); });
     store<uint32_t>(chp + offsetof(qel_cdb_header_t, cdb_hdr_checksum), sum);
-    commit_image();
 }
 
-void qecfg_compiler::commit_image() {
+void cdb_writer::commit_image() {
     size_t file_len = size_t(load<uint32_t>(chp)) + 4;
-    if (opt.swap_endianness)
+    if (reverse)
         qecfg_cdef_swap(reinterpret_cast<qel_cdb_header_t *>(chp), numeric_range_offsets);
     try {
         sink->commit(file_len);

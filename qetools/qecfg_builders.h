@@ -13,10 +13,11 @@
 
 // The records of the whole source, one table per kind.
 struct record_table {
+    record_table(const char *name, size_t au) : t(name, au) {}
     tbl t;
     uint32_t count = 0;
-    template <typename R> void append(qecfg_context &c, const R &rec) {
-        std::memcpy(c.alloc_tble(&t, sizeof(R)), &rec, sizeof(R));
+    template <typename R> void append(table_arena &arena, const R &rec) {
+        std::memcpy(arena.alloc_tble(&t, sizeof(R)), &rec, sizeof(R));
         count++;
     }
 };
@@ -137,7 +138,6 @@ class attr_builder : public stanza_builder {
     void set_max_sd_idx(uint16_t idx);
     void add_element_type(zu_data_type_t type);
     void build_structured_value(); // from the element types, once its run ends
-    void release_lists();
 
   private:
     char *record() override { return reinterpret_cast<char *>(&rec); }

@@ -50,10 +50,10 @@ void class_builder::store_statement(const keyword_row &row, char *v) {
 
 // An unnamed class takes the output file name up to its first ".cdef".
 void class_builder::name_from_output() {
-    size_t pos = c.opt.cdefname.find(".cdef");
+    size_t pos = c.opt.output_name.find(".cdef");
     if (pos == std::string::npos)
-        c.raise_fatal("Invalid cdef out file name (must end in .cdef)", nullptr, nullptr, 0, 1);
-    std::string name = c.opt.cdefname.substr(0, pos);
+        raise_fatal(msg::unnamed_class_output, 0);
+    std::string name = c.opt.output_name.substr(0, pos);
     rec.u_rc_name.offset[0] = c.add_to_tbl(strings(), name.c_str(), name.size() + 1);
 }
 
@@ -98,7 +98,7 @@ uint32_t class_builder::new_section(cdb_ref_t rsrc_class_t::*table, size_t size,
 
 void map_builder::start() {
     if (open())
-        c.raise_fatal("Only one ClassToManagerMapping stanza allowed", nullptr, nullptr, 0, 1);
+        raise_fatal(msg::second_map, 0);
     rec = rsrc_cmmap_t{};
     rec.rcm_cb_ID = RSRC_CMMAP_ID;
     rec.u_rcm_strings = table_ref(c.new_tbl("CMMapStrings", STRINGS_AU));
@@ -115,7 +115,7 @@ void map_builder::store_statement(const keyword_row &row, char *v) {
 
 void map_builder::complete() {
     if (rec.rcm_first_key > rec.rcm_last_key)
-        c.statement_error("Error: FirstKey is greater than LastKey.");
+        c.statement_error(msg::first_key_above_last);
     maps.append(c, rec);
     rec.rcm_cb_ID = 0;
 }

@@ -198,7 +198,7 @@ void remove_stale_temporaries(int dir, const std::string &entry) {
 
 // ---------------------------------------------------------------------------
 
-class file_sink final : public file_output {
+class file_sink final : public image_sink {
   public:
     file_sink(std::string path, file_identity source, bool flush)
         : name_(std::move(path)), source_(source), flush_(flush) {}
@@ -207,12 +207,14 @@ class file_sink final : public file_output {
         if (dir_ >= 0)
             close(dir_);
     }
-    void prepare() override;
     char *acquire(size_t size) override;
     void commit(size_t length) override;
     void abandon() noexcept override;
 
   private:
+    // Checks the output name and creates the temporary file (or chooses to
+    // write in place).
+    void prepare();
     [[noreturn]] void refuse(int err, const std::string &reason);
     bool locate();
     void open_directory(int at, const std::string &path);
@@ -230,7 +232,6 @@ class file_sink final : public file_output {
     std::string name_; // as given
     file_identity source_;
     bool flush_;
-    bool prepared_ = false;
     int dir_ = -1; // the directory of the file the name designates
     bool dir_readable_ = false;
     struct stat dir_st_ {};
@@ -313,9 +314,6 @@ void file_sink::check_replaceable() {
 }
 
 void file_sink::prepare() {
-    if (prepared_)
-        return;
-    prepared_ = true;
     bool exists = locate();
     if (exists && source_.known && old_.st_dev == source_.dev && old_.st_ino == source_.ino)
         fail(CREATE, 0, "Output is the source file");
@@ -566,7 +564,7 @@ void memory_sink::abandon() noexcept {
     out_.shrink_to_fit();
 }
 
-std::unique_ptr<file_output> make_file_sink(const std::string &path, file_identity source, bool flush) {
+std::unique_ptr<image_sink> make_file_sink(const std::string &path, file_identity source, bool flush) {
     return std::make_unique<file_sink>(path, source, flush);
 }
 

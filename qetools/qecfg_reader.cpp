@@ -1,17 +1,19 @@
 // The source reader: one pass over the source in pieces of at most 254
-// characters, comment removal, stanza framing, and each statement checked
-// against its keyword row and handed to the open builder.
+// characters, comment removal, and each header and statement matched with
+// its stanza type and keyword row, with its position.
+#include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstdlib>
+#include <cstring>
 #include <vector>
 
-#include "qecfg.h"
+#include "qecfg_context.h"
+#include "qecfg_source.h"
 
 namespace {
-
 constexpr size_t PIECE_MAX = QECFG_PIECE_MAX;
 constexpr size_t LINE_BUFFER = PIECE_MAX + 2;
+} // namespace
 
 // Hands out the pieces that fgets with a 255-byte size would return, each
 // NUL-terminated and writable. A piece that ends with its newline inside the
@@ -24,13 +26,14 @@ class piece_reader {
     // The next piece, or null at the end of the input; a read error is
     // reported through err.
     char *next(int &err) {
+        nul_ = false;
         if (pos_ == len_ && !refill(err))
             return nullptr;
         char *start = buf_.data() + pos_;
         size_t avail = std::min(len_ - pos_, PIECE_MAX);
         if (char *nl = static_cast<char *>(std::memchr(start, '\n', avail))) {
             *nl = '\0';
-            pos_ += size_t(nl - start) + 1;
+            advance(size_t(nl - start) + 1);
             return start;
         }
         size_t n = 0;
@@ -44,13 +47,16 @@ class piece_reader {
                 take = size_t(static_cast<const char *>(nl) - from) + 1;
             std::memcpy(line_ + n, from, take);
             n += take;
-            pos_ += take;
+            advance(take);
             if (nl)
                 break;
         }
         line_[n] = '\0';
         return n > 0 && err == 0 ? line_ : nullptr;
     }
+
+    // The last piece held a NUL byte, which would end it early.
+    bool held_nul() const { return nul_; }
 
   private:
     static constexpr size_t BUFFER_SIZE = 1 << 16;
@@ -60,14 +66,26 @@ class piece_reader {
         len_ = std::fread(buf_.data(), 1, BUFFER_SIZE, fp_);
         if (len_ == 0 && std::ferror(fp_))
             err = errno ? errno : EIO;
+        const void *nul = std::memchr(buf_.data(), '\0', len_);
+        nul_at_ = nul ? size_t(static_cast<const char *>(nul) - buf_.data()) : len_;
         return len_ > 0;
+    }
+
+    // Moves past n bytes of the buffer, noting the NUL among them.
+    void advance(size_t n) {
+        nul_ = nul_ || (nul_at_ >= pos_ && nul_at_ < pos_ + n);
+        pos_ += n;
     }
 
     FILE *fp_;
     std::vector<char> buf_;
     size_t pos_ = 0, len_ = 0;
+    size_t nul_at_ = 0; // the first NUL byte of the buffer, or len_
+    bool nul_ = false;
     char line_[LINE_BUFFER];
 };
+
+namespace {
 
 // Character classes of the comment scan.
 enum char_class : unsigned char { ORDINARY, BLANK, NEWLINE, QUOTE, HASH, SLASH, END };
@@ -131,8 +149,6 @@ bool strip_comments(char *line) {
     return true;
 }
 
-namespace {
-
 int find_stanza_type(const char *name) {
     for (int i = 0; i < NUM_STANZA_TYPES; i++)
         if (stanza_defs[i].name[0] == name[0] && std::strcmp(stanza_defs[i].name, name) == 0)
@@ -140,149 +156,129 @@ int find_stanza_type(const char *name) {
     return -1;
 }
 
-// The required-before-optional and duplicate rules. The given rows change
-// before the value is converted; a value then refused ends the compile.
-void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyword_row &row, const char *name) {
-    if (row.optional) {
-        if (given.required != stanza_defs[stanza].required_mask)
-            c.statement_error("Optional attribute discovered before all required attributes have been defined", name);
-        if ((given.optional & row.bit) && !row.repeatable)
-            c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
-        given.optional |= row.bit;
-        return;
-    }
-    if ((given.required & row.bit) && !row.repeatable)
-        c.statement_error("Already defined. Duplicated definitions not allowed for ", name);
-    given.required |= row.bit;
-    if (c.opt.debugLevel > 1)
-        QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
+namespace {
+
+// The keyword row of a stanza type, compared by length first.
+const keyword_row *find_row(int stanza, const char *name, size_t len) {
+    static const auto lengths = [] {
+        std::array<std::array<size_t, MAX_ROWS_PER_STANZA>, NUM_STANZA_TYPES> l{};
+        for (int i = 0; i < NUM_STANZA_TYPES; i++)
+            for (int r = 0; r < stanza_defs[i].num_rows; r++)
+                l[i][r] = std::strlen(stanza_defs[i].rows[r].name);
+        return l;
+    }();
+    const stanza_def &def = stanza_defs[stanza];
+    for (int i = 0; i < def.num_rows; i++)
+        if (lengths[stanza][i] == len && std::memcmp(def.rows[i].name, name, len) == 0)
+            return &def.rows[i];
+    return nullptr;
 }
+
+uint32_t column(const char *piece, const char *at) { return uint32_t(at - piece); }
 
 } // namespace
 
-void qecfg_compiler::read_source(const char *filename) {
-    source_fp = opt.source_in_memory ? open_memory_source(opt.source_text) : std::fopen(filename, "r");
-    if (!source_fp) {
-        int e = errno;
-        raise_fatal(filename, ": cannot open because: ", std::strerror(e), 0, e);
-    }
-    piece_reader reader(source_fp);
+source_reader::source_reader(FILE *fp, uint64_t lines_before)
+    : pieces_(std::make_unique<piece_reader>(fp)), line_(lines_before) {}
+
+source_reader::~source_reader() = default;
+
+bool source_reader::next(source_line &out) {
+    if (stop_.id != msg::none)
+        return false;
     int err = 0;
-    while (char *line = reader.next(err)) {
-        linenum++;
-        if (!strip_comments(line))
+    while (char *piece = pieces_->next(err)) {
+        line_++;
+        if (pieces_->held_nul()) {
+            stop_ = source_stop{msg::nul_character, line_, 0};
+            return false;
+        }
+        if (!strip_comments(piece))
             continue;
-        if (line[0] == ' ' || line[0] == '\t')
-            read_statement(line);
-        else
-            read_header(line);
+        if (piece[0] == ' ' || piece[0] == '\t') {
+            read_statement(piece, out);
+            return true;
+        }
+        out = source_line{};
+        out.header = true;
+        out.line = line_;
+        out.name = piece;
+        out.name_length = uint32_t(std::strlen(piece));
+        out.stanza = stanza_ = find_stanza_type(piece);
+        headed_ = true;
+        return true;
     }
     // A read error is not the end of the input.
     if (err)
-        raise_fatal(filename, ": cannot read because: ", std::strerror(err), 0, err);
-    std::fclose(source_fp);
-    source_fp = nullptr;
+        stop_ = source_stop{msg::cannot_read, 0, err};
+    return false;
 }
 
-stanza_builder &qecfg_compiler::builder_of(int t) {
-    switch (t) {
-    case ST_CONTROL_DEFINITION:
-    case ST_RESOURCE_CLASS: return cls;
-    case ST_CLASS_TO_MANAGER_MAPPING: return map;
-    case ST_RESOURCE_VARIABLE_CLASS: return vclass;
-    case ST_CLASS_ACTION: return actions[0];
-    case ST_RESOURCE_ACTION: return actions[1];
-    default: return is_sd_stanza(t) ? static_cast<stanza_builder &>(sd) : attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
-    }
-}
-
-// A header completes the open structured-data run and the open actions,
-// then starts its own builder, which completes the open record of its kind.
-// Records of other kinds stay open until the next stanza of their kind or
-// the end of the source.
-void qecfg_compiler::read_header(char *line) {
-    int t = find_stanza_type(line);
-    if (t < 0)
-        statement_error("Invalid table name: ", line);
-    prev_stanza = stanza;
-    stanza = t;
-    if (is_sd_stanza(t)) {
-        sd.start_stanza(t, prev_stanza);
-        sd.given = given_rows{};
-        return;
-    }
-    if (sd.pending())
-        sd.complete();
-    complete_open_actions();
-    start_stanza(t);
-    builder_of(t).given = given_rows{};
-    sd.link_attribute(nullptr);
-}
-
-void qecfg_compiler::start_stanza(int t) {
-    switch (t) {
-    case ST_CONTROL_DEFINITION:
-        if (cls.open())
-            complete_class();
-        cls.start();
-        break;
-    case ST_RESOURCE_CLASS: break; // fills the class its ControlDefinition opened
-    case ST_CLASS_TO_MANAGER_MAPPING: map.start(); break;
-    case ST_RESOURCE_VARIABLE_CLASS: vclass.start(); break;
-    case ST_CLASS_ACTION: actions[0].start(); break;
-    case ST_RESOURCE_ACTION: actions[1].start(); break;
-    default: attrs[t - ST_PERSISTENT_RESOURCE_ATTRIBUTE].start(); break;
-    }
-}
-
-void qecfg_compiler::complete_open_actions() {
-    for (action_builder *a : {&actions[1], &actions[0]})
-        if (a->open())
-            a->complete();
-}
-
-void qecfg_compiler::read_statement(char *il) {
-    if (stanza < 0)
-        statement_error("Attribute found but no table defined yet");
-    const stanza_def &def = stanza_defs[stanza];
-    char *name = il;
-    while (*name == ' ' || *name == '\t')
-        name++;
-    if (!*name)
-        return;
+// The checks are made in the order in which the compiler reports them.
+void source_reader::read_statement(char *piece, source_line &out) const {
+    out = source_line{};
+    out.line = line_;
+    out.stanza = stanza_;
+    char *name = piece + std::strspn(piece, " \t");
+    out.name = name;
+    out.name_column = column(piece, name);
     char *eq = std::strchr(name, '=');
-    if (!eq)
-        statement_error("Missing '=' after attribute name");
+    out.name_length = uint32_t(eq ? eq - name : std::strlen(name));
+    if (!headed_) {
+        out.problem = msg::statement_before_stanza;
+        return;
+    }
+    if (!eq) {
+        out.problem = msg::missing_equals;
+        return;
+    }
     *eq = '\0';
     char *value = eq + 1;
-    if (std::strcmp(value, "\"\"") == 0)
+    out.value = value;
+    out.value_column = column(piece, value);
+    if (std::strcmp(value, "\"\"") == 0) {
+        out.skipped = true;
         return;
+    }
     value = strip_quotes(value);
-    if (!value)
-        statement_error("Unmatched double quotes for attribute: ", name);
-    if (std::strlen(value) > QECFG_MAX_VALUE_LEN)
-        statement_error("Attibute value exceeds maximum length: ", name);
-    const keyword_row *row = nullptr;
-    size_t name_len = size_t(eq - name);
-    for (int i = 0; i < def.num_rows && !row; i++)
-        if (row_name_len[stanza][i] == name_len && std::memcmp(def.rows[i].name, name, name_len) == 0)
-            row = &def.rows[i];
-    if (!row)
-        statement_error("Attribute name not defined in table (name/table): ", name, def.name);
-    if (!*value) {
-        QECFG_TRACE(*this, "In file %s: ", opt.cdefsrc.c_str());
-        statement_error("Missing attribute value: ", name);
+    if (!value) {
+        out.problem = msg::unmatched_quotes;
+        return;
     }
-    if (opt.debugLevel > 1)
-        QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, name, value,
-                    int(std::strlen(value)));
-    stanza_builder &b = builder_of(stanza);
-    apply_row_rules(*this, b.given, stanza, *row, name);
-    b.store_statement(*row, value);
-    // A structured attribute owns the definition of the run that follows.
-    if (row->what == statement::data_type) {
-        attr_builder &a = attrs[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE];
-        if (zu_is_sd_type(a.data_type()))
-            sd.link_attribute(&a);
+    out.value = value;
+    out.value_column = column(piece, value);
+    out.value_length = uint32_t(std::strlen(value));
+    if (out.value_length > QECFG_MAX_VALUE_LEN) {
+        out.problem = msg::value_too_long;
+        return;
     }
+    if (stanza_ >= 0)
+        out.row = find_row(stanza_, name, out.name_length);
+}
+
+source_model read_source_model(std::string_view text) {
+    source_model m;
+    FILE *fp = open_memory_source(text);
+    if (!fp) {
+        m.stop = source_stop{msg::cannot_read, 0, errno};
+        return m;
+    }
+    source_reader reader(fp);
+    source_line l;
+    while (reader.next(l)) {
+        if (l.header || m.stanzas.empty())
+            m.stanzas.push_back(model_stanza{});
+        model_stanza &st = m.stanzas.back();
+        if (l.header) {
+            st = model_stanza{l.line, l.stanza, l.name, {}};
+            continue;
+        }
+        st.statements.push_back(model_statement{l.line, std::string(l.name, l.name_length),
+                                                l.value ? std::string(l.value, l.value_length) : std::string(),
+                                                l.name_column, l.value_column, l.skipped, l.row, l.problem});
+    }
+    std::fclose(fp);
+    m.last_line = reader.last_line();
+    m.stop = reader.stop();
+    return m;
 }

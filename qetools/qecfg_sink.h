@@ -51,17 +51,9 @@ struct file_identity {
 
 // The image is written to a file: a temporary one renamed over the output, or
 // the output itself in place where that cannot be done (see qecfg_output.cpp).
-class file_output : public image_sink {
-  public:
-    // Checks the output name and creates the temporary file, before the
-    // compile; acquire does it when it has not been done. Throws
-    // sink_failure, whose text stays valid while this object lives.
-    virtual void prepare() = 0;
-};
-
 // flush: the image and the directory entry reach the disk before commit
 // returns.
-std::unique_ptr<file_output> make_file_sink(const std::string &path, file_identity source, bool flush = true);
+std::unique_ptr<image_sink> make_file_sink(const std::string &path, file_identity source, bool flush = true);
 
 // The identity of an existing file, unknown when it cannot be found.
 file_identity identity_of(const std::string &path);

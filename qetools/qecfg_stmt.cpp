@@ -47,7 +47,7 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
     case statement::text: {
         tbl *st = strings();
         if (!st)
-            c.statement_error("No tbl for strings table");
+            c.statement_error(msg::no_strings_table);
         store<uint32_t>(target, c.add_to_tbl(st, v, std::strlen(v) + 1));
         break;
     }
@@ -62,7 +62,7 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
             {rc_props, rc_props_cnt}, {pa_props, pa_props_cnt}, {da_props, da_props_cnt}, {act_props, act_props_cnt}};
         auto &k = tables[int(row.what) - int(statement::class_properties)];
         uint32_t w = load<uint32_t>(target);
-        c.set_props(&w, k.props, k.count, v);
+        set_props(&w, k.props, k.count, v);
         store<uint32_t>(target, w);
         break;
     }
@@ -76,7 +76,7 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
     case statement::variety_range: store_variety(target, v); break;
     case statement::value_display_name:
         if (!vvdisp_tbl)
-            c.statement_error("No ValidValue to attach ValueDisplayName to.");
+            c.statement_error(msg::no_valid_value_for_display_name);
         store<uint16_t>(vvdisp_tbl->tbl_base + vvdisp_off, uint16_t(stmt_int(v)));
         break;
     case statement::permission:
@@ -95,14 +95,14 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
 void stanza_builder::store_variety(char *field, char *v) {
     char *comma = std::strchr(v, ',');
     if (!comma)
-        c.statement_error("Incorrect variety format");
+        c.statement_error(msg::variety_format);
     *comma = '\0';
     tbl *vt = class_table(&rsrc_class_t::u_rc_variety_lists);
     uint32_t sec = load<uint32_t>(field);
     uint32_t entry = next_list_entry(c, vt, sec, sizeof(vl_entry));
     const char *high = comma + 1;
     if (std::strchr(high, ','))
-        c.statement_error("Too many varieties");
+        c.statement_error(msg::too_many_varieties);
     store<uint32_t>(vt->tbl_base + entry + offsetof(vl_entry, vl_high_val), uint32_t(stmt_int(high)));
     store<uint32_t>(vt->tbl_base + entry + offsetof(vl_entry, vl_low_val), uint32_t(stmt_int(v)));
     count_entry(vt, sec + offsetof(variety_list_t, vl_count));
@@ -128,18 +128,18 @@ void stanza_builder::place_pair(zu_data_type_t dt, char *v, value_slot low, valu
     char *comma = std::strchr(v, ',');
     if (comma) {
         *comma = '\0';
-        if (c.str_to_zu(&val, dt, comma + 1) != 0)
-            c.statement_error("str_to_zu: Invalid data");
-        if (c.copy_this_type(high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-            c.statement_error("copy_this_type error");
+        if (str_to_zu(c, &val, dt, comma + 1) != 0)
+            c.statement_error(msg::invalid_data);
+        if (copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+            c.statement_error(msg::value_not_placed);
         val = zu_value_t{};
-        if (c.str_to_zu(&val, dt, v) != 0 || c.copy_this_type(low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-            c.statement_error("str_to_zu: Invalid data");
+        if (str_to_zu(c, &val, dt, v) != 0 || copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+            c.statement_error(msg::invalid_data);
         return;
     }
-    if (c.str_to_zu(&val, dt, v) != 0)
-        c.statement_error("str_to_zu: Invalid data");
-    if (c.copy_this_type(low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
-        c.copy_this_type(high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-        c.statement_error("copy_this_type error");
+    if (str_to_zu(c, &val, dt, v) != 0)
+        c.statement_error(msg::invalid_data);
+    if (copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
+        copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+        c.statement_error(msg::value_not_placed);
 }

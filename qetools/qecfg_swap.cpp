@@ -9,23 +9,8 @@
 #include <algorithm>
 #include <initializer_list>
 
-#include "qecfg.h"
-
-const uint16_t kb_dtc_table_1[ZU_NUM_DATA_TYPES] = {
-    0x0000, 0x0002,                                 // UNKNOWN, None
-    0x0023, 0x0023, 0x0023, 0x0023, 0x0023, 0x0023, // the numbers
-    0x000F, 0x000F, 0x000F,                         // String, Binary, RH
-    0x0007, 0x000C,                                 // SD, SBS
-    0x001F, 0x001F, 0x001F, 0x001F, 0x001F, 0x001F, // arrays of numbers
-    0x0017, 0x0017, 0x0017, 0x0017,                 // arrays of references
-};
-
-const zu_data_type_t kb_dtc_base_types_1[ZU_NUM_DATA_TYPES] = {
-    ZU_UNKNOWN,  ZU_UNKNOWN,    ZU_UNKNOWN,         ZU_UNKNOWN, ZU_UNKNOWN, ZU_UNKNOWN, ZU_UNKNOWN, // 0 to 6
-    ZU_UNKNOWN,  ZU_UNKNOWN,    ZU_UNKNOWN,         ZU_UNKNOWN, ZU_UNKNOWN, ZU_UNKNOWN,             // 7 to 12
-    ZU_INT32,    ZU_UINT32,     ZU_INT64,           ZU_UINT64,  ZU_FLOAT32, ZU_FLOAT64,             // 13 to 18
-    ZU_CHAR_PTR, ZU_BINARY_PTR, ZU_RSRC_HANDLE_PTR, ZU_SD_PTR,                                      // 19 to 22
-};
+#include "cdb_format.h"
+#include "qecfg_tbl.h"
 
 void swap_any(void *enum_p, int size) {
     if (size != 2 && size != 4 && size != 8)
@@ -91,7 +76,6 @@ uint32_t ref_offset(const swap_image &img, size_t pos) { return load_u32(img, po
 
 zu_data_type_t load_type(const swap_image &img, size_t pos) { return zu_data_type_t(load_u32(img, pos, ZU_UNKNOWN)); }
 
-bool is_array_type(zu_data_type_t type) { return type < ZU_NUM_DATA_TYPES && (kb_dtc_table_1[type] & ZU_DTC_ARRAY); }
 
 // Calls walk with the position of the item that the reference at ref_pos
 // designates in the table at base, unless it designates nothing.
@@ -156,9 +140,9 @@ void swap_value_at(const swap_image &img, size_t pos, zu_data_type_t type, size_
         return;
     default:
         // UNKNOWN, None, SBS and undefined types are left whole, offset included.
-        if (is_array_type(type))
+        if (zu_is_array_type(type))
             swap_reference(img, pos, sbase, [&](size_t body) {
-                swap_array_body(img, body, kb_dtc_base_types_1[type], sbase, depth);
+                swap_array_body(img, body, zu_data_type_t(zu_element_type(type)), sbase, depth);
             });
         return;
     }
@@ -191,7 +175,7 @@ zu_data_type_t own_value_type(const swap_image &img, size_t sd_ref_pos, zu_data_
 // on an array attribute stores values of the element type, not array bodies.
 zu_data_type_t range_type(const swap_image &img, size_t rec, zu_data_type_t type) {
     const bool given = img.numeric_ranges && rec <= UINT32_MAX && img.numeric_ranges->count(uint32_t(rec));
-    return given && is_array_type(type) ? kb_dtc_base_types_1[type] : type;
+    return given && zu_is_array_type(type) ? zu_data_type_t(zu_element_type(type)) : type;
 }
 
 typedef void (*record_walker)(const swap_image &, size_t, uint32_t, const swap_bases &);
@@ -213,7 +197,7 @@ void swap_var_list(const swap_image &img, size_t vlist_pos) {
 void swap_valid_vals(const swap_image &img, size_t vv_pos, zu_data_type_t type, size_t sbase) {
     using L = valid_values_t;
     // Valid values of an array attribute are single values of its element type.
-    const zu_data_type_t entry_type = is_array_type(type) ? kb_dtc_base_types_1[type] : type;
+    const zu_data_type_t entry_type = zu_is_array_type(type) ? zu_data_type_t(zu_element_type(type)) : type;
     const uint32_t count = load_u32(img, vv_pos + offsetof(L, vv_count), 0);
     for_each_item(img, vv_pos + offsetof(L, vv_values), count, sizeof(vv_entry), [&](size_t e) {
         swap_value(img, e + offsetof(vv_entry, vv_low_val), entry_type, sbase);

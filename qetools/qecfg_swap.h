@@ -9,11 +9,10 @@
 
 #include "cdb.h"
 
-// Characteristic flags of each data type; ZU_DTC_ARRAY marks the array types.
-constexpr uint16_t ZU_DTC_ARRAY = 0x10;
-extern const uint16_t kb_dtc_table_1[ZU_NUM_DATA_TYPES];
-// The element type of each array type, ZU_UNKNOWN for the other types.
-extern const zu_data_type_t kb_dtc_base_types_1[ZU_NUM_DATA_TYPES];
+// The byte-order reversal of a finished image, in place. Records named in
+// numeric_ranges (file offsets of dynamic attribute records) hold plain
+// numbers in their range fields.
+void qecfg_cdef_swap(qel_cdb_header_t *cdb_hdr_p, const std::unordered_set<uint32_t> &numeric_ranges);
 
 // The image being reversed. Positions are byte offsets from the header, the
 // same numbers as the file offsets. Every access goes through at(), so a

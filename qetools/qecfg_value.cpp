@@ -7,7 +7,8 @@
 #include <cstring>
 #include <limits>
 
-#include "qecfg_context.h"
+#include "qecfg_fatal.h"
+#include "qecfg_value.h"
 
 namespace {
 
@@ -231,7 +232,7 @@ int oct_convert(const char *p, int type, char *out_buf) {
     return 0;
 }
 
-int qecfg_context::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in) {
+int str_to_zu(table_arena &arena, zu_value_t *zu_out, zu_data_type_t zu_type, const char *str_in) {
     if (!str_in || *str_in == '\0')
         return -1;
     switch (scalar_zu(zu_type)) {
@@ -249,13 +250,13 @@ int qecfg_context::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const c
         return convert_float64(str_in, zu_out);
     case ZU_CHAR_PTR: {
         size_t size = std::strlen(str_in) + 1;
-        zu_out->ptr_char = static_cast<char *>(std::memcpy(cfg_malloc(size), str_in, size));
+        zu_out->ptr_char = static_cast<char *>(std::memcpy(arena.cfg_malloc(size), str_in, size));
         return 0;
     }
     case ZU_BINARY_PTR: {
         if (str_in[0] == '0' && str_in[1] != 'x')
             return -1;
-        char *image = static_cast<char *>(cfg_malloc(binary_image_size(std::strlen(str_in))));
+        char *image = static_cast<char *>(arena.cfg_malloc(binary_image_size(std::strlen(str_in))));
         int rc = str_in[0] == '0' ? hex_convert(image, str_in) : oct_convert(str_in, OCT_FORM_BINARY, image);
         if (rc != 0)
             return -1;
@@ -267,7 +268,7 @@ int qecfg_context::str_to_zu(zu_value_t *zu_out, zu_data_type_t zu_type, const c
     }
 }
 
-void qecfg_context::set_props(uint32_t *dest, const props_t *props, int len, char *vnoq) {
+void set_props(uint32_t *dest, const props_t *props, int len, char *vnoq) {
     if (!vnoq)
         return;
     char *save = nullptr;
@@ -277,7 +278,7 @@ void qecfg_context::set_props(uint32_t *dest, const props_t *props, int len, cha
             if (std::strcmp(name, props[i].s) == 0)
                 found = &props[i];
         if (!found)
-            raise_fatal(name, ": invalid property", nullptr, 0, 1);
+            raise_fatal(msg::invalid_property, 0, {name});
         *dest |= found->p;
     }
 }

@@ -79,9 +79,9 @@ TEST(LibrarySource, MessagesNameAnInMemorySourceByItsName) {
     // An empty source held in memory is read like an empty file.
     r = qecfg::compile_to_memory(qecfg::source::bytes("empty.src", ""), image, opt);
     EXPECT_EQ(r.message, "No classes defined");
-    // Bytes after a NUL are part of the source, as they are in a file.
+    // A NUL byte is read as it is from a file, and refused.
     std::string nul = BASE_SOURCE + std::string("\0", 1) + "\nBogus\n";
-    EXPECT_EQ(compile_text(nul).message, "17: Invalid table name: Bogus\n");
+    EXPECT_EQ(compile_text(nul).message, "16: NUL character in source\n");
 }
 
 } // namespace

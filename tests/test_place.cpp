@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "qecfg.h"
+#include "qecfg_value.h"
 
 namespace {
 
@@ -15,7 +15,7 @@ using std::string;
 
 class Place : public ::testing::Test {
   protected:
-    qecfg_compiler c{qecfg_options{}};
+    table_arena c;
     tbl *st = c.new_tbl("ClassStrings", 8192);
     alignas(8) unsigned char field[8] = {};
     body_cursor a, sda, sde;
@@ -32,7 +32,7 @@ TEST_F(Place, ArrayFilledWhileTheTableGrowsKeepsEveryElement) {
         texts.push_back(string(30, char('A' + i % 26)) + char('0' + i % 10)); // 31 chars: 32-byte body
         zu_value_t in{};
         in.ptr_char = texts.back().data();
-        ASSERT_EQ(c.copy_this_type(value_slot::in(st, slot), &in, ZU_CHAR_PTR_ARRAY, TYPE_SAME, st, &a, n), 0);
+        ASSERT_EQ(copy_this_type(c, value_slot::in(st, slot), &in, ZU_CHAR_PTR_ARRAY, TYPE_SAME, st, &a, n), 0);
     }
     uint32_t array = 8, first_text = array + 8 + 8 * n; // 2416
     ASSERT_GT(first_text + 32 * n, 8192u);
@@ -50,7 +50,7 @@ TEST_F(Place, StructuredValueBuiltWhileTheTableGrowsKeepsEveryElement) {
     const int n = 200; // 8 + 16 * 200 = 3208 bytes, then a 16 + 24-byte handle array per element
     for (int i = 0; i < n; i++) {
         a = body_cursor{};
-        ASSERT_EQ(c.copy_this_sd_type(value_slot::at(field), ZU_RSRC_HANDLE_PTR_ARRAY, DFLT_DEFAULT, st, &a, &sda,
+        ASSERT_EQ(copy_this_sd_type(c, value_slot::at(field), ZU_RSRC_HANDLE_PTR_ARRAY, DFLT_DEFAULT, st, &a, &sda,
                                       &sde, n, ZU_SD_PTR),
                   0);
     }

@@ -35,7 +35,37 @@ TEST(Reader, CommentsAndQuotesInTheValue) {
     EXPECT_EQ(class_name_with("    Name=\"x//y\" // the name"), "x//y"); // '//' inside quotes
     EXPECT_EQ(class_name_with("    Name=x/y /* z"), "x/y");              // '/*' needs no '*/'
     EXPECT_EQ(class_name_with("    Name=Test.Class\r"), "Test.Class\r"); // a carriage return is text
-    EXPECT_EQ(class_name_with(std::string("    Name=Te\0st", 14)), "Te"); // a NUL ends the line
+}
+
+// A NUL byte would end its line early and drop the rest silently: it is
+// refused on its line, in a line ended in place, in a piece copied across
+// the reader's buffer, in a comment, and in a source of nothing but NULs.
+TEST(Reader, NulByteIsRefusedOnItsLine) {
+    const std::string nul(1, '\0');
+    std::string src = BASE_SOURCE;
+    src.replace(src.find("Name=Test.Class"), 15, "Name=Te" + nul + "st");
+    EXPECT_EQ(compile_text(src).message, "9: NUL character in source\n");
+    EXPECT_EQ(compile_text("# note " + nul + "\n" + BASE_SOURCE).message, "1: NUL character in source\n");
+    EXPECT_EQ(compile_text(BASE_SOURCE + nul).message, "16: NUL character in source\n");
+    // A long line is read in pieces: the NUL is in the second one.
+    EXPECT_EQ(compile_text(BASE_SOURCE + "#" + std::string(300, 'x') + nul + "\n").message,
+              "17: NUL character in source\n");
+    // Past the reader's 64 KiB buffer, in a piece that spans two reads.
+    std::string comments;
+    while (comments.size() < 65536 - 200)
+        comments += "# " + std::string(97, 'c') + "\n";
+    size_t lines = comments.size() / 100;
+    src = comments + std::string(150, 'x') + nul + std::string(80, 'y') + "\n";
+    EXPECT_EQ(compile_text(src).message, std::to_string(lines + 1) + ": NUL character in source\n");
+    EXPECT_EQ(compile_text(std::string(1 << 17, '\0')).message, "1: NUL character in source\n");
+}
+
+TEST(Reader, DevZeroAsSourceEnds) {
+    std::vector<std::uint8_t> image;
+    qecfg::result r = qecfg::compile_to_memory(qecfg::source::file("/dev/zero"), image);
+    EXPECT_EQ(r.id, msg::nul_character);
+    EXPECT_EQ(r.message, "1: NUL character in source\n");
+    EXPECT_EQ(r.status, 1);
 }
 
 TEST(Reader, HeaderFollowedByCommentIsRecognised) {
@@ -73,15 +103,14 @@ TEST(Reader, UnterminatedLastLineIsRead) {
 TEST(Reader, LineNumbersPastTwoToTheThirtyOneArePrintedInFull) {
     // Reading 2^31 lines takes minutes; the count is started high instead.
     qecfg_options opt;
-    opt.source_in_memory = true;
-    opt.source_text = "\nBogus\n";
+    opt.source = qecfg::source::bytes("input.src", "\nBogus\n");
     qecfg_compiler c(opt);
     c.linenum = (uint64_t(1) << 31) + 1;
     std::string message;
     try {
         c.run();
     } catch (const qecfg_fatal &f) {
-        message = f.message;
+        message = f.text(true);
     }
     EXPECT_EQ(message, "2147483651: Invalid table name: Bogus\n");
 }

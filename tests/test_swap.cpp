@@ -10,6 +10,7 @@
 #include <sstream>
 
 #include "compile_support.h"
+#include "qecfg_swap.h"
 
 namespace {
 

@@ -9,14 +9,8 @@ namespace {
 
 struct traced_compile {
     captured_stream out, err;
-    qecfg_compiler c;
-    explicit traced_compile(int level) : c([&] {
-        qecfg_options o;
-        o.debugLevel = level;
-        o.trace_out = out.file();
-        o.trace_err = err.file();
-        return o;
-    }()) {}
+    table_arena c;
+    explicit traced_compile(int level) : c(table_trace{level, out.file(), err.file()}) {}
 };
 
 TEST(Tbl, GrowthInWholeUnitsIsTraced) {

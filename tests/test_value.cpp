@@ -12,7 +12,8 @@
 #include <tuple>
 #include <utility>
 
-#include "qecfg.h"
+#include "qecfg_fatal.h"
+#include "qecfg_value.h"
 
 namespace {
 
@@ -36,16 +37,16 @@ struct converted {
     }
 };
 
-converted convert(qecfg_compiler &c, zu_data_type_t type, const char *text) {
+converted convert(table_arena &c, zu_data_type_t type, const char *text) {
     converted r;
     std::memset(&r.v, 0xA5, sizeof r.v);
-    r.rc = c.str_to_zu(&r.v, type, text);
+    r.rc = str_to_zu(c, &r.v, type, text);
     return r;
 }
 
 class ValueConvert : public ::testing::Test {
   protected:
-    qecfg_compiler c{qecfg_options{}};
+    table_arena c;
 };
 
 // ---------------------------------------------------------------- integers
@@ -333,12 +334,12 @@ TEST_F(ValueConvert, PropertiesAddBits) {
     for (auto &[before, text, after] : lists) {
         uint32_t dest = before;
         string buf = text;
-        c.set_props(&dest, test_props, TEST_PROPS_SEARCHED, buf.data());
+        set_props(&dest, test_props, TEST_PROPS_SEARCHED, buf.data());
         EXPECT_EQ(dest, after) << text;
     }
     uint32_t dest = 0;
     string buf = "Public,ReadOnly";
-    c.set_props(&dest, pa_props, pa_props_cnt, buf.data());
+    set_props(&dest, pa_props, pa_props_cnt, buf.data());
     EXPECT_EQ(dest, 0x21u);
 }
 
@@ -352,11 +353,12 @@ TEST_F(ValueConvert, UnknownPropertyStopsWithItsName) {
         uint32_t dest = 0;
         string buf = text;
         try {
-            c.set_props(&dest, test_props, TEST_PROPS_SEARCHED, buf.data());
+            set_props(&dest, test_props, TEST_PROPS_SEARCHED, buf.data());
             ADD_FAILURE() << text << " was accepted";
         } catch (const qecfg_fatal &f) {
-            EXPECT_EQ(f.message, string(name) + ": invalid property\n");
-            EXPECT_EQ(f.code, 1);
+            EXPECT_EQ(f.id, msg::invalid_property);
+            EXPECT_EQ(f.text(true), string(name) + ": invalid property\n");
+            EXPECT_EQ(f.status, 1);
         }
     }
 }

@@ -27,6 +27,8 @@
 #include <string_view>
 #include <vector>
 
+#include "qecfg/messages.h"
+
 namespace qecfg {
 
 // The command line's options.
@@ -71,6 +73,11 @@ struct source {
 struct result {
     int status = 0;
     std::string message;
+    // The message as data: its row in the table of messages (messages.h),
+    // the row's stable name, and the line printed before it (0 for none).
+    message_id id = message_id::none;
+    const char *name = "none";
+    std::uint64_t line = 0;
 
     explicit operator bool() const { return status == 0; }
 };

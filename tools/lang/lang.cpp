@@ -1,10 +1,12 @@
 // The language view over the compiler's keyword table. The only place that
 // classifies the compiler's statements for the checker and the documents.
 #include "lang.h"
+#include "qecfg_source.h"
 
 #include <cstring>
 
-#include "qecfg.h"
+#include "qecfg_keywords.h"
+#include "qecfg_value.h"
 #include "zu_qel.h"
 
 namespace lang {
@@ -145,10 +147,9 @@ uint32_t version_number(const std::string &text) {
 zu_data_type_t element_type_of(zu_data_type_t type) { return scalar_zu(type); }
 
 bool value_converts(zu_data_type_t type, const std::string &text, zu_value_t *number) {
-    // A conversion needs a compile only for the storage of text copies.
-    qecfg_compiler c{qecfg_options{}};
+    table_arena texts; // where text and binary values are copied
     zu_value_t v{};
-    if (c.str_to_zu(&v, type, text.c_str()) != 0)
+    if (str_to_zu(texts, &v, type, text.c_str()) != 0)
         return false;
     if (number)
         *number = v;

@@ -1,0 +1,90 @@
+// The image writer alone: records made by hand, no source and no compile.
+#include <gtest/gtest.h>
+
+#include <cerrno>
+
+#include "qecfg_bld.h"
+
+namespace {
+
+uint32_t word_at(const std::vector<uint8_t> &b, size_t off) { return load<uint32_t>(b.data() + off); }
+
+struct hand_made_records {
+    table_arena arena;
+    record_table classes{"ResourceClasses", 3584}, maps{"ResourceCMMaps", 480}, managers{"ResourceManagers", 192},
+        var_classes{"ResourceVariableClasses", 320};
+    std::vector<bool> named;
+    std::set<std::pair<const tbl *, size_t>> numeric_ranges;
+
+    hand_made_records() {
+        rsrc_class_t c{};
+        c.rc_cb_ID = RSRC_CLASS_ID;
+        c.rc_class_id = 7;
+        classes.append(arena, c);
+        rsrc_mgr_t m{};
+        tbl *strings = arena.new_tbl("ManagerStrings", 8192);
+        arena.add_to_tbl(strings, "RM", 3);
+        m.u_rm_strings_table = table_ref(strings);
+        managers.append(arena, m);
+        maps.append(arena, rsrc_cmmap_t{});
+    }
+    compiled_records records() { return {classes, maps, managers, var_classes, named, numeric_ranges}; }
+};
+
+TEST(Writer, LaysRecordsIntoDsectsBehindTheHeaderAndAnchors) {
+    hand_made_records r;
+    std::vector<uint8_t> image;
+    memory_sink sink(image);
+    cdb_writer(r.arena, image_target{&sink, "", {}}, false).write(r.records());
+    size_t manager = CDB_HEADER_SIZE + 3 * CDB_ANCHOR_SIZE + sizeof(rsrc_class_t);
+    size_t map = manager + sizeof(rsrc_mgr_t) + 8;
+    ASSERT_EQ(image.size(), map + sizeof(rsrc_cmmap_t));
+    EXPECT_EQ(word_at(image, 0), image.size() - 4);
+    EXPECT_EQ(word_at(image, offsetof(qel_cdb_header_t, cdb_hdr_dsect_count)), 3u);
+    EXPECT_EQ(load<uint16_t>(image.data() + offsetof(qel_cdb_header_t, cdb_hdr_max_class_id)), 7);
+    // Class, manager, map: each anchor gives its dsect's offset and length.
+    const size_t anchors[][3] = {{CDB_DSECT_CLASS, CDB_HEADER_SIZE + 3 * CDB_ANCHOR_SIZE, sizeof(rsrc_class_t)},
+                                 {CDB_DSECT_RSRC_MGR, manager, sizeof(rsrc_mgr_t) + 8},
+                                 {CDB_DSECT_CMMAP, map, sizeof(rsrc_cmmap_t)}};
+    for (size_t i = 0; i < 3; i++)
+        for (size_t f = 0; f < 3; f++)
+            EXPECT_EQ(word_at(image, CDB_HEADER_SIZE + CDB_ANCHOR_SIZE * i + 4 * f), anchors[i][f]) << i << "," << f;
+    EXPECT_EQ(std::string(reinterpret_cast<const char *>(image.data()) + manager + sizeof(rsrc_mgr_t)), "RM");
+    uint32_t all = 0;
+    for (size_t off = 0; off < image.size(); off += 4)
+        all ^= word_at(image, off);
+    EXPECT_EQ(all, 0u); // the checksum makes the words cancel out
+}
+
+TEST(Writer, ReversedImageHasItsLengthWordSwapped) {
+    hand_made_records r;
+    std::vector<uint8_t> image;
+    memory_sink sink(image);
+    cdb_writer(r.arena, image_target{&sink, "", {}}, true).write(r.records());
+    EXPECT_EQ(__builtin_bswap32(word_at(image, 0)), image.size() - 4);
+}
+
+// A sink that fails at commit, and must then be told to give up the image.
+class failing_sink final : public image_sink {
+  public:
+    char *acquire(size_t size) override { return (bytes = std::vector<char>(size)).data(); }
+    void commit(size_t) override { throw sink_failure{"Cannot write CDB file: ", ENOSPC}; }
+    void abandon() noexcept override { abandoned = true; }
+    std::vector<char> bytes;
+    bool abandoned = false;
+};
+
+TEST(Writer, FailedCommitIsFatalAndAbandonsTheImage) {
+    hand_made_records r;
+    failing_sink sink;
+    try {
+        cdb_writer(r.arena, image_target{&sink, "", {}}, false).write(r.records());
+        ADD_FAILURE() << "the commit failure was lost";
+    } catch (const qecfg_fatal &f) {
+        EXPECT_EQ(f.id, msg::cannot_write);
+        EXPECT_EQ(f.text(false), std::string("Cannot write CDB file: ") + std::strerror(ENOSPC));
+    }
+    EXPECT_TRUE(sink.abandoned);
+}
+
+} // namespace
