@@ -65,6 +65,10 @@ const error_case cases[] = {
      "ElementIndeces must be consecutive: the element 1 of this DefineSDDefinition definition needs ElementIndex=1"},
     {"the first of a repeated statement", CLASS + MAP + PATTR + "    GroupID=1\n    GroupID=2 # here\n",
      "Already defined. Duplicated definitions not allowed for GroupID (first given on line 23)"},
+    {"a NUL byte on its line", CLASS + MAP + "ResourceAction\n    Name=a" + std::string(1, '\0') + "b # here\n",
+     "NUL character in source"},
+    {"a stanza header ending like another message", CLASS + MAP + "Bogus: invalid property # here\n",
+     "Invalid table name: Bogus: invalid property: no such stanza type (statements must be indented)"},
     {"lines counted in pieces of 254 characters",
      "#" + std::string(253, 'x') + "  // read as a line of its own\n" + CLASS + MAP + PATTR +
          "    Properties=Nope # here\n",

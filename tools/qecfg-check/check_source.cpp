@@ -1,9 +1,7 @@
 // The check of one source: one compile in memory, then the source model.
 #include "check_source.h"
 
-#include <cerrno>
 #include <cstdlib>
-#include <cstring>
 #include <new>
 
 #include "qecfg/qecfg.h"
@@ -31,12 +29,9 @@ qecfg::result compile(const std::string &name, const std::string &text, const st
     return r;
 }
 
-// A compile that fails for want of memory (the image's mapping fails with
-// status 1) says nothing about the source.
-bool ran_out_of_memory(const std::string &message) {
-    std::string why = std::strerror(ENOMEM);
-    return message.size() >= why.size() && message.compare(message.size() - why.size(), why.size(), why) == 0;
-}
+// A compile that fails for want of memory says nothing about the source: an
+// image held in memory fails to be mapped only when it cannot be allocated.
+bool ran_out_of_memory(const qecfg::result &r) { return r.id == qecfg::message_id::cannot_map; }
 
 } // namespace
 
@@ -52,13 +47,13 @@ check_report trouble(std::string why) { return {2, {finding{severity::error, dia
 check_report check_text(const std::string &name, const std::string &text, const check_options &opt) try {
     std::string output_name = opt.output_name.empty() ? default_output_name(name) : opt.output_name;
     qecfg::result r = compile(name, text, output_name);
-    if (r.status != 0 && (r.status != 1 || ran_out_of_memory(r.message)))
+    if (r.status != 0 && (r.status != 1 || ran_out_of_memory(r)))
         return trouble(r.message.rfind(name + ": ", 0) == 0 ? r.message.substr(name.size() + 2) : r.message);
     check_report report;
     report.status = r.status;
     source_model m = read_model(text);
     if (r.status == 1) {
-        explained e = explain_failure(r.message, m);
+        explained e = explain_failure(r, m);
         report.findings.push_back(finding{severity::error, std::move(e.where), "", std::move(e.notes)});
         return report;
     }

@@ -5,8 +5,6 @@
 
 #include <algorithm>
 #include <cctype>
-#include <cstdlib>
-#include <cstring>
 #include <functional>
 #include <utility>
 
@@ -14,11 +12,7 @@ namespace check {
 
 namespace {
 
-const std::string INVALID_PROPERTY = ": invalid property";
-
-bool ends_with(const std::string &s, const std::string &tail) {
-    return s.size() >= tail.size() && s.compare(s.size() - tail.size(), tail.size(), tail) == 0;
-}
+using qecfg::message_id;
 
 std::string lower(std::string_view v) {
     std::string s(v);
@@ -151,6 +145,19 @@ std::vector<const stanza *> completed_at(const source_model &m, int line) {
 
 std::string stanza_name(int kind) { return stanza_names[kind]; }
 
+// The subjects of a message as they stand in its text: the text without the
+// fixed words of its row before the first subject and after the last.
+std::string subjects(const diagnostic &d, message_id id) {
+    std::string_view row = qecfg::message(id).text;
+    size_t first = row.find("%s"), last = row.rfind("%s");
+    if (first == std::string_view::npos)
+        return "";
+    size_t head = first, tail = row.size() - last - 2;
+    if (d.text.size() < head + tail)
+        return "";
+    return d.text.substr(head, d.text.size() - head - tail);
+}
+
 // The error stays on the compiler's line; the stanza that lacks statements
 // is a note.
 explained incomplete_stanza(const diagnostic &d, const source_model &m) {
@@ -167,7 +174,7 @@ explained incomplete_stanza(const diagnostic &d, const source_model &m) {
 explained optional_too_early(const diagnostic &d, const source_model &m) {
     const stanza *s = m.stanza_at(d.line);
     const statement *st = m.statement_at(d.line);
-    if (!s || !s->type || !st || !ends_with(d.text, std::string(st->keyword())))
+    if (!s || !s->type || !st || subjects(d, message_id::optional_before_required) != st->keyword())
         return {d, {}};
     std::string text = d.text.substr(0, d.text.size() - st->keyword().size()) + ": " + quoted(st->keyword()) + " ";
     if (!s->type->optional_accepted)
@@ -218,7 +225,7 @@ explained invalid_name(const diagnostic &d, const source_model &m, const std::ve
 explained unknown_statement(const diagnostic &d, const source_model &m) {
     const statement *st = m.statement_at(d.line);
     const stanza *s = m.stanza_at(d.line);
-    if (!st || !s || !s->type || !ends_with(d.text, std::string(st->keyword()) + s->type->name))
+    if (!st || !s || !s->type || subjects(d, message_id::unknown_keyword) != std::string(st->keyword()) + s->type->name)
         return {d, {}};
     std::string prefix = d.text.substr(0, d.text.size() - st->keyword().size() - s->type->name.size());
     return {{d.line, prefix + quoted(st->keyword()) + " is no statement of " + s->type->name +
@@ -227,7 +234,7 @@ explained unknown_statement(const diagnostic &d, const source_model &m) {
 }
 
 explained unknown_stanza(const diagnostic &d, const source_model &) {
-    std::string header = d.text.substr(std::strlen("Invalid table name: "));
+    std::string header = subjects(d, message_id::invalid_stanza);
     if (!header.empty() && header.back() == '\r')
         return {{d.line, d.text + ": the line ends with a carriage return; save the source with plain newlines"}, {}};
     std::vector<std::string> names(std::begin(stanza_names), std::end(stanza_names));
@@ -341,7 +348,7 @@ explained attribute_element_type(const diagnostic &d, const source_model &m) {
 
 // The property statement that holds a word its stanza does not allow.
 explained invalid_property(const diagnostic &d, const source_model &m) {
-    std::string word = d.text.substr(0, d.text.size() - INVALID_PROPERTY.size());
+    std::string word = subjects(d, message_id::invalid_property);
     for (const stanza &s : m.stanzas)
         for (const statement &st : s.statements) {
             if (!st.row || st.row->kind != lang::value_kind::properties || st.skipped)
@@ -364,61 +371,62 @@ explained invalid_property(const diagnostic &d, const source_model &m) {
 explained with_hint(const diagnostic &d, const std::string &hint) { return {{d.line, d.text + ": " + hint}, {}}; }
 
 struct explanation {
-    const char *message; // the start of the compiler's message
+    message_id id;
     std::function<explained(const diagnostic &, const source_model &)> explain;
 };
 
 const explanation explanations[] = {
-    {"Optional attribute discovered before all required attributes have been defined", optional_too_early},
-    {"Previous stanza incomplete", incomplete_stanza},
-    {"str_to_zu: Invalid data", invalid_data},
-    {"Invalid data type",
+    {message_id::optional_before_required, optional_too_early},
+    {message_id::incomplete_stanza, incomplete_stanza},
+    {message_id::invalid_data, invalid_data},
+    {message_id::invalid_data_type,
      [](const diagnostic &d, const source_model &m) {
          return invalid_name(d, m, lang::data_type_names(), "the data types");
      }},
-    {"Invalid variable type",
+    {message_id::invalid_variable_type,
      [](const diagnostic &d, const source_model &m) {
          return invalid_name(d, m, lang::variable_type_names(), "the variable types");
      }},
-    {"Attribute name not defined in table (name/table): ", unknown_statement},
-    {"Invalid table name: ", unknown_stanza},
-    {"No tbl for strings table", no_class_yet},
-    {"No class for", no_class_yet},
-    {"Only one ClassToManagerMapping stanza allowed", second_mapping},
-    {"Error: FirstKey is greater than LastKey.", keys_reversed},
-    {"No ResourceManager defined for the class-to-manager map", no_manager},
-    {"Invalid cdef out file name (must end in .cdef)", unnamed_class},
-    {"Already defined. Duplicated definitions not allowed for ", duplicate_statement},
-    {"ElementIndeces must be consecutive", index_out_of_sequence},
-    {"dump_dflt: copy_this_sd_type default error", attribute_element_type},
-    {"No classes defined",
+    {message_id::unknown_keyword, unknown_statement},
+    {message_id::invalid_stanza, unknown_stanza},
+    {message_id::invalid_property, invalid_property},
+    {message_id::no_strings_table, no_class_yet},
+    {message_id::no_class_for_sd, no_class_yet},
+    {message_id::no_class_for_persistent_attribute, no_class_yet},
+    {message_id::no_class_for_persistent_class_attribute, no_class_yet},
+    {message_id::no_class_for_dynamic_attribute, no_class_yet},
+    {message_id::no_class_for_action, no_class_yet},
+    {message_id::second_map, second_mapping},
+    {message_id::first_key_above_last, keys_reversed},
+    {message_id::no_manager, no_manager},
+    {message_id::unnamed_class_output, unnamed_class},
+    {message_id::duplicate_statement, duplicate_statement},
+    {message_id::element_index_order, index_out_of_sequence},
+    {message_id::structured_default_not_built, attribute_element_type},
+    {message_id::no_classes,
      [](const diagnostic &d, const source_model &) {
          return with_hint(d, "the source has no " + stanza_name(ST_CONTROL_DEFINITION) + " stanza");
      }},
-    {"No class-to-manager maps defined",
+    {message_id::no_maps,
      [](const diagnostic &d, const source_model &) {
          return with_hint(d, "the source needs a " + stanza_name(ST_CLASS_TO_MANAGER_MAPPING) + " stanza");
      }},
 };
 
-// The line and text of a message "LINE: text" (or "text" without a line).
-diagnostic split_message(const std::string &message) {
-    size_t digits = 0;
-    while (digits < message.size() && std::isdigit(static_cast<unsigned char>(message[digits])))
-        digits++;
-    if (ends_with(message, INVALID_PROPERTY) || digits == 0 || message.compare(digits, 2, ": ") != 0)
-        return {0, message};
-    return {std::atoi(message.c_str()), message.substr(digits + 2)};
+// The line and text of the compiler's message: the message is "LINE: text"
+// when it has a line, else the text alone.
+diagnostic split_message(const qecfg::result &r) {
+    if (r.line == 0)
+        return {0, r.message};
+    return {int(r.line), r.message.substr(std::to_string(r.line).size() + 2)};
 }
 
 } // namespace
 
-explained explain_failure(const std::string &message, const source_model &m) {
-    diagnostic d = split_message(message);
-    if (d.line == 0 && ends_with(d.text, INVALID_PROPERTY))
-        return invalid_property(d, m);
+explained explain_failure(const qecfg::result &failure, const source_model &m) {
+    diagnostic d = split_message(failure);
     for (const explanation &e : explanations)
-        if (d.text.rfind(e.message, 0) == 0)
+        if (e.id == failure.id)
             return e.explain(d, m);
     return {d, {}};
 }

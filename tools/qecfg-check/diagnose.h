@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "qecfg/qecfg.h"
 #include "source_model.h"
 
 namespace check {
@@ -23,9 +24,10 @@ struct explained {
     std::vector<diagnostic> notes;
 };
 
-// `message` is the compiler's message without its final newline. This is
-// the one place that recognises the compiler's messages by their text.
-explained explain_failure(const std::string &message, const source_model &m);
+// `failure` is the compiler's result, its message without a final newline.
+// Its message identity says which explanation applies; its line is the
+// error's line.
+explained explain_failure(const qecfg::result &failure, const source_model &m);
 
 // The closest of `candidates` to a misspelt word, or empty.
 std::string nearest(std::string_view word, const std::vector<std::string> &candidates);
