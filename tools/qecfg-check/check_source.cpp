@@ -35,6 +35,11 @@ bool ran_out_of_memory(const qecfg::result &r) { return r.id == qecfg::message_i
 
 } // namespace
 
+std::string without_source_name(const qecfg::result &r, const std::string &name) {
+    bool names_source = r.id == qecfg::message_id::cannot_open || r.id == qecfg::message_id::cannot_read;
+    return names_source ? r.message.substr(name.size() + 2) : r.message;
+}
+
 std::string default_output_name(const std::string &source) {
     std::string base = source.substr(source.find_last_of('/') + 1);
     size_t dot = base.find_last_of('.');
@@ -48,7 +53,7 @@ check_report check_text(const std::string &name, const std::string &text, const 
     std::string output_name = opt.output_name.empty() ? default_output_name(name) : opt.output_name;
     qecfg::result r = compile(name, text, output_name);
     if (r.status != 0 && (r.status != 1 || ran_out_of_memory(r)))
-        return trouble(r.message.rfind(name + ": ", 0) == 0 ? r.message.substr(name.size() + 2) : r.message);
+        return trouble(without_source_name(r, name));
     check_report report;
     report.status = r.status;
     source_model m = read_model(text);

@@ -36,6 +36,10 @@ inline constexpr const char OUT_OF_MEMORY[] = "out of memory";
 // `name`) and explains its failure or runs the enabled warnings.
 check_report check_text(const std::string &name, const std::string &text, const check_options &opt);
 
+// The compiler's message without the source's name where its row begins with
+// it: the checker puts the name in front itself.
+std::string without_source_name(const qecfg::result &r, const std::string &name);
+
 // The output name qecfg is assumed to be given: the source's file name with
 // its extension replaced by .cdef.
 std::string default_output_name(const std::string &source);

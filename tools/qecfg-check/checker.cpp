@@ -140,7 +140,7 @@ std::string unreadable(const std::string &path) {
     qecfg::result r = qecfg::compile_to_memory(qecfg::source::file(path), image, opt);
     if (r.status == 0 || r.status == 1)
         return std::string("cannot read because: ") + std::strerror(read_errno);
-    return r.message.rfind(path + ": ", 0) == 0 ? r.message.substr(path.size() + 2) : r.message;
+    return without_source_name(r, path);
 }
 
 // Reads and checks one source; exhausted memory is a finding like any other.
