@@ -15,7 +15,8 @@
 
 namespace {
 void agree(const std::string &a, const std::string &b) {
-    if (a != b) std::abort();
+    if (a != b)
+        std::abort();
 }
 } // namespace
 
@@ -33,7 +34,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
         (void)decompile(f);
         std::vector<change> changes = diff(f, f);
         judge(changes);
-        if (!changes.empty()) std::abort();
+        if (!changes.empty())
+            std::abort();
     } catch (const cdb_invalid &) {
     }
     return 0;

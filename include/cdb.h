@@ -584,8 +584,8 @@ struct valid_perms_t {
 };
 
 inline constexpr valid_perms_t perm_list[] = {
-    {'q', 0x1}, {'l', 0x2}, {'e', 0x4}, {'v', 0x8}, {'d', 0x10}, {'c', 0x20}, {'s', 0x40}, {'o', 0x80}, {'a', 0x100},
-    {'x', 0x200},
+    {'q', 0x1},  {'l', 0x2},  {'e', 0x4},  {'v', 0x8},   {'d', 0x10},
+    {'c', 0x20}, {'s', 0x40}, {'o', 0x80}, {'a', 0x100}, {'x', 0x200},
 };
 inline constexpr int num_perm_list = 10;
 

@@ -158,10 +158,10 @@ constexpr size_t ZU_SD_ELEMENT_SIZE = 16;
 // Names of the data types in source text, indexed by the type (zuTypeMap maps
 // entry i to the value i).
 inline constexpr const char *zuTypeStr[ZU_NUM_DATA_TYPES] = {
-    "UNKNOWN",    "None",         "Int32",        "UInt32",       "Int64",       "UInt64",
-    "Float32",    "Float64",      "String",       "Binary",       "RH",          "SD",
-    "SBS",        "Int32Array",   "UInt32Array",  "Int64Array",   "UInt64Array", "Float32Array",
-    "Float64Array", "StringArray", "BinaryArray", "RHArray",      "SDArray",
+    "UNKNOWN",      "None",        "Int32",       "UInt32",     "Int64",       "UInt64",
+    "Float32",      "Float64",     "String",      "Binary",     "RH",          "SD",
+    "SBS",          "Int32Array",  "UInt32Array", "Int64Array", "UInt64Array", "Float32Array",
+    "Float64Array", "StringArray", "BinaryArray", "RHArray",    "SDArray",
 };
 
 constexpr bool zu_is_array_type(uint32_t dt) { return dt >= ZU_INT32_ARRAY && dt <= ZU_SD_PTR_ARRAY; }

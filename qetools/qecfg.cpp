@@ -20,7 +20,6 @@ void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> 
 
 qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {}
 
-
 namespace {
 
 // The required-before-optional and duplicate rules. The given rows change

@@ -2,8 +2,8 @@
 // image or the fatal message and status out.
 #include <cstring>
 
-#include "qecfg/qecfg.h"
 #include "qecfg.h"
+#include "qecfg/qecfg.h"
 #include "qecfg_sink.h"
 
 namespace {

@@ -160,7 +160,7 @@ void attr_builder::build_structured_value() {
     for (uint32_t i = 0; i < n; i++) {
         array = body_cursor{};
         if (copy_this_sd_type(c, value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
-                                data_type()) != 0)
+                              data_type()) != 0)
             c.statement_error(dynamic_ ? msg::structured_initial_not_built : msg::structured_default_not_built);
     }
 }

@@ -56,8 +56,10 @@ void cdb_writer::add_varID_to_var_class(const char *srch_name, uint32_t varID) {
         for (size_t i = 0; i < n; i++) {
             const char *rec = in->var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
             const tbl *strings = ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl));
-            const char *name = in->var_class_named[i] ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
-                                            : nullptr;
+            const char *name =
+                in->var_class_named[i]
+                    ? string_at(strings, load<uint32_t>(rec + offsetof(rsrc_variable_class_t, u_rvc_name)))
+                    : nullptr;
             if (name)
                 var_class_index.emplace(name, uint32_t(i * sizeof(rsrc_variable_class_t)));
         }
@@ -93,17 +95,18 @@ size_t cdb_writer::cdb_size() {
     for (size_t i = 0; i < nvc; i++) {
         const char *rec = in->var_classes.t.tbl_base + i * sizeof(rsrc_variable_class_t);
         uint32_t count = load<uint32_t>(rec + offsetof(rsrc_variable_class_t, rvc_var_count));
-        size += sizeof(rsrc_variable_class_t) + round8(tbl_used(ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl)))) +
+        size += sizeof(rsrc_variable_class_t) +
+                round8(tbl_used(ref_tbl(rec, offsetof(rsrc_variable_class_t, u_rvc_string_tbl)))) +
                 round8(4 * size_t(count));
     }
     size_t nmap = tbl_used(&in->maps.t) / sizeof(rsrc_cmmap_t);
     for (size_t i = 0; i < nmap; i++)
-        size += sizeof(rsrc_cmmap_t) +
-                round8(tbl_used(ref_tbl(in->maps.t.tbl_base + i * sizeof(rsrc_cmmap_t), offsetof(rsrc_cmmap_t, u_rcm_strings))));
+        size += sizeof(rsrc_cmmap_t) + round8(tbl_used(ref_tbl(in->maps.t.tbl_base + i * sizeof(rsrc_cmmap_t),
+                                                               offsetof(rsrc_cmmap_t, u_rcm_strings))));
     size_t nmgr = tbl_used(&in->managers.t) / sizeof(rsrc_mgr_t);
     for (size_t i = 0; i < nmgr; i++)
-        size += sizeof(rsrc_mgr_t) +
-                round8(tbl_used(ref_tbl(in->managers.t.tbl_base + i * sizeof(rsrc_mgr_t), offsetof(rsrc_mgr_t, u_rm_strings_table))));
+        size += sizeof(rsrc_mgr_t) + round8(tbl_used(ref_tbl(in->managers.t.tbl_base + i * sizeof(rsrc_mgr_t),
+                                                             offsetof(rsrc_mgr_t, u_rm_strings_table))));
     size_t ncl = tbl_used(&in->classes.t) / sizeof(rsrc_class_t);
     for (size_t i = 0; i < ncl; i++)
         size += class_dsect_size(reinterpret_cast<rsrc_class_t *>(in->classes.t.tbl_base + i * sizeof(rsrc_class_t)));
@@ -217,9 +220,9 @@ void cdb_writer::add_rsrc_class_tbls() {
     if (!n)
         raise_fatal(msg::no_class_dsects, 0);
     static const size_t copied[] = {
-        offsetof(rsrc_class_t, u_rc_pattrsC),  offsetof(rsrc_class_t, u_rc_dattrsC),
-        offsetof(rsrc_class_t, u_rc_pattrs),   offsetof(rsrc_class_t, u_rc_dattrs),
-        offsetof(rsrc_class_t, u_rc_actionsC), offsetof(rsrc_class_t, u_rc_actions),
+        offsetof(rsrc_class_t, u_rc_pattrsC),       offsetof(rsrc_class_t, u_rc_dattrsC),
+        offsetof(rsrc_class_t, u_rc_pattrs),        offsetof(rsrc_class_t, u_rc_dattrs),
+        offsetof(rsrc_class_t, u_rc_actionsC),      offsetof(rsrc_class_t, u_rc_actions),
         offsetof(rsrc_class_t, u_rc_variety_lists), offsetof(rsrc_class_t, u_rc_sd_defs),
         offsetof(rsrc_class_t, u_rc_valid_vals),
     };
@@ -258,8 +261,8 @@ void cdb_writer::add_rsrc_mgr_tbls() {
     for (size_t i = 0; i < n; i++) {
         const char *src = in->managers.t.tbl_base + i * sizeof(rsrc_mgr_t);
         char *rec = copy_record(CDB_DSECT_RSRC_MGR, src, sizeof(rsrc_mgr_t));
-        copy_table(rec, offsetof(rsrc_mgr_t, u_rm_strings_table), ref_tbl(src, offsetof(rsrc_mgr_t, u_rm_strings_table)),
-                   true);
+        copy_table(rec, offsetof(rsrc_mgr_t, u_rm_strings_table),
+                   ref_tbl(src, offsetof(rsrc_mgr_t, u_rm_strings_table)), true);
         // The name is the first string, and the strings follow the record.
         std::memset(rec + offsetof(rsrc_mgr_t, u_rm_RMname), 0, sizeof(cdb_ref_t));
         std::memset(rec + offsetof(rsrc_mgr_t, u_rm_strings_table), 0, sizeof(cdb_ref_t));
@@ -277,7 +280,8 @@ void cdb_writer::add_rsrc_cmmap_tbls() {
     for (size_t i = 0; i < n; i++) {
         const char *src = in->maps.t.tbl_base + i * sizeof(rsrc_cmmap_t);
         char *rec = copy_record(CDB_DSECT_CMMAP, src, sizeof(rsrc_cmmap_t));
-        copy_table(rec, offsetof(rsrc_cmmap_t, u_rcm_strings), ref_tbl(src, offsetof(rsrc_cmmap_t, u_rcm_strings)), true);
+        copy_table(rec, offsetof(rsrc_cmmap_t, u_rcm_strings), ref_tbl(src, offsetof(rsrc_cmmap_t, u_rcm_strings)),
+                   true);
         dsect_idx++;
     }
 }

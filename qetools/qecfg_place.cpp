@@ -7,7 +7,9 @@
 
 namespace {
 
-bool valid_code(int type_out) { return type_out == TYPE_SAME || (type_out >= INIT_DEFAULT && type_out <= R_HI_DEFAULT); }
+bool valid_code(int type_out) {
+    return type_out == TYPE_SAME || (type_out >= INIT_DEFAULT && type_out <= R_HI_DEFAULT);
+}
 
 bool is_default_code(int type_out) { return type_out == INIT_DEFAULT || type_out == DFLT_DEFAULT; }
 
@@ -27,8 +29,8 @@ uint32_t append_zero_body(table_arena &arena, tbl *st, size_t len) {
 }
 
 // A value of one of the types 2 to 9 into a field (or an array element).
-int place_scalar(table_arena &arena, value_slot out, const zu_value_t *in, zu_data_type_t type, int type_out,
-                 tbl *st, bool element) {
+int place_scalar(table_arena &arena, value_slot out, const zu_value_t *in, zu_data_type_t type, int type_out, tbl *st,
+                 bool element) {
     bool given = type_out == TYPE_SAME;
     if (given && !in && type != ZU_RSRC_HANDLE_PTR)
         return -1;
@@ -74,11 +76,12 @@ int place_scalar(table_arena &arena, value_slot out, const zu_value_t *in, zu_da
 }
 
 void init_array(table_arena &arena, tbl *str_tbl, body_cursor *a, uint32_t array_cnt, value_slot out_data,
-                                uint32_t *elem_idx) {
+                uint32_t *elem_idx) {
     if (array_cnt == 0)
         raise_fatal(msg::place_empty_array, 0);
     if (!a->set) {
-        uint32_t off = append_zero_body(arena, str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
+        uint32_t off =
+            append_zero_body(arena, str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
         *a = body_cursor{true, off};
         put_offset(out_data, off);
     }
@@ -88,7 +91,7 @@ void init_array(table_arena &arena, tbl *str_tbl, body_cursor *a, uint32_t array
 }
 
 void init_scalar_sd(table_arena &arena, tbl *str_tbl, body_cursor *a, uint32_t sd_cnt, value_slot out_data,
-                                    uint32_t *elem_idx) {
+                    uint32_t *elem_idx) {
     if (sd_cnt == 0) {
         // A structured value without elements keeps room for one.
         uint32_t off = append_zero_body(arena, str_tbl, ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE);
@@ -107,12 +110,13 @@ void init_scalar_sd(table_arena &arena, tbl *str_tbl, body_cursor *a, uint32_t s
     store<uint32_t>(count, *elem_idx + 1);
 }
 
-void init_array_sd(table_arena &arena, tbl *str_tbl, body_cursor *array_anchor, body_cursor *sd_anchor, uint32_t array_cnt,
-                                   uint32_t sd_cnt, value_slot out_data, uint32_t *sd_elem_idx) {
+void init_array_sd(table_arena &arena, tbl *str_tbl, body_cursor *array_anchor, body_cursor *sd_anchor,
+                   uint32_t array_cnt, uint32_t sd_cnt, value_slot out_data, uint32_t *sd_elem_idx) {
     if (array_cnt == 0)
         raise_fatal(msg::place_empty_array, 0);
     if (!array_anchor->set) {
-        uint32_t off = append_zero_body(arena, str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
+        uint32_t off =
+            append_zero_body(arena, str_tbl, ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * size_t(array_cnt));
         *array_anchor = body_cursor{true, off};
         put_offset(out_data, off);
     }
@@ -127,11 +131,9 @@ int copy_this_type(table_arena &arena, value_slot out_data, const zu_value_t *in
                    int type_out, tbl *str_tbl, body_cursor *array_anchor, uint32_t array_cnt) {
     switch (type_in) {
     case ZU_NONE: return 0;
-    case ZU_SD_PTR:
-        raise_fatal(msg::place_structured, 0);
+    case ZU_SD_PTR: raise_fatal(msg::place_structured, 0);
     case ZU_SBS_PTR: raise_fatal(msg::place_sbs, 0);
-    case ZU_SD_PTR_ARRAY:
-        raise_fatal(msg::place_structured_array, 0);
+    case ZU_SD_PTR_ARRAY: raise_fatal(msg::place_structured_array, 0);
     case ZU_RSRC_HANDLE_PTR: return place_scalar(arena, out_data, nullptr, type_in, TYPE_SAME, str_tbl, false);
     default: break;
     }
@@ -142,7 +144,8 @@ int copy_this_type(table_arena &arena, value_slot out_data, const zu_value_t *in
         init_array(arena, str_tbl, a, array_cnt, out_data, &idx);
         if (!valid_code(type_out))
             return -1;
-        value_slot element = value_slot::in(str_tbl, a->off + uint32_t(ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * idx));
+        value_slot element =
+            value_slot::in(str_tbl, a->off + uint32_t(ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * idx));
         return place_scalar(arena, element, in_data, scalar_zu(type_in), type_out, str_tbl, true);
     }
     if (type_in < ZU_INT32 || type_in > ZU_BINARY_PTR || !valid_code(type_out))
@@ -151,8 +154,8 @@ int copy_this_type(table_arena &arena, value_slot out_data, const zu_value_t *in
 }
 
 int copy_this_sd_type(table_arena &arena, value_slot out_data, zu_data_type_t type_in, int type_out, tbl *str_tbl,
-                                      body_cursor *array_anchor, body_cursor *sd_array_anchor, body_cursor *sd_element_anchor,
-                                      uint32_t array_cnt, zu_data_type_t sd_type) {
+                      body_cursor *array_anchor, body_cursor *sd_array_anchor, body_cursor *sd_element_anchor,
+                      uint32_t array_cnt, zu_data_type_t sd_type) {
     uint32_t idx = 0;
     if (sd_type == ZU_SD_PTR)
         init_scalar_sd(arena, str_tbl, sd_element_anchor, array_cnt, out_data, &idx);
@@ -163,8 +166,8 @@ int copy_this_sd_type(table_arena &arena, value_slot out_data, zu_data_type_t ty
     if (array_cnt == 0)
         return 0;
     uint32_t element = sd_element_anchor->off + uint32_t(ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * idx);
-    int r = copy_this_type(arena, value_slot::in(str_tbl, element + offsetof(zu_structured_data_element_t, value)), nullptr,
-                           type_in, type_out, str_tbl, array_anchor, 1);
+    int r = copy_this_type(arena, value_slot::in(str_tbl, element + offsetof(zu_structured_data_element_t, value)),
+                           nullptr, type_in, type_out, str_tbl, array_anchor, 1);
     store<uint32_t>(str_tbl->tbl_base + element, type_in);
     return r;
 }

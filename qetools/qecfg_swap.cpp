@@ -32,8 +32,10 @@ struct spot {
     size_t off;
     int width;
 };
-#define NUM(rec, f) spot{offsetof(rec, f), int(sizeof(rec::f))}
-#define REF(rec, f) spot{offsetof(rec, f), 4}
+#define NUM(rec, f)                                                                                                    \
+    spot { offsetof(rec, f), int(sizeof(rec::f)) }
+#define REF(rec, f)                                                                                                    \
+    spot { offsetof(rec, f), 4 }
 
 void swap_field(const swap_image &img, size_t pos, int width) {
     if (char *p = img.at(pos, size_t(width)))
@@ -75,7 +77,6 @@ uint16_t load_u16(const swap_image &img, size_t pos) {
 uint32_t ref_offset(const swap_image &img, size_t pos) { return load_u32(img, pos, CDB_NONE); }
 
 zu_data_type_t load_type(const swap_image &img, size_t pos) { return zu_data_type_t(load_u32(img, pos, ZU_UNKNOWN)); }
-
 
 // Calls walk with the position of the item that the reference at ref_pos
 // designates in the table at base, unless it designates nothing.
@@ -129,9 +130,7 @@ void swap_value_at(const swap_image &img, size_t pos, zu_data_type_t type, size_
         return;
     case ZU_INT64:
     case ZU_UINT64:
-    case ZU_FLOAT64:
-        swap_field(img, pos, 8);
-        return;
+    case ZU_FLOAT64: swap_field(img, pos, 8); return;
     case ZU_BINARY_PTR: // the length word only; the data bytes stay
         swap_reference(img, pos, sbase, [&](size_t body) { swap_spots(img, body, {NUM(zu_binary_t, length)}); });
         return;
@@ -239,10 +238,9 @@ void swap_pattr(const swap_image &img, size_t first, uint32_t count, const swap_
     for_each_item(img, first, count, sizeof(R), [&](size_t rec) {
         swap_attr_lists_and_value<R>(img, rec, offsetof(R, ra_dflt_value), b);
         swap_spots(img, rec,
-                   {NUM(R, ra_data_type), NUM(R, ra_cb_ID), NUM(R, ra_props), REF(R, u_ra_name),
-                    NUM(R, ra_dscr_msgid), NUM(R, ra_disp_msgid), NUM(R, ra_group_msgid), NUM(R, ra_group_id),
-                    NUM(R, ra_attr_id), REF(R, u_ra_variety_list), REF(R, u_ra_valid_vals), REF(R, u_ra_sd),
-                    NUM(R, ra_max_sd_idx)});
+                   {NUM(R, ra_data_type), NUM(R, ra_cb_ID), NUM(R, ra_props), REF(R, u_ra_name), NUM(R, ra_dscr_msgid),
+                    NUM(R, ra_disp_msgid), NUM(R, ra_group_msgid), NUM(R, ra_group_id), NUM(R, ra_attr_id),
+                    REF(R, u_ra_variety_list), REF(R, u_ra_valid_vals), REF(R, u_ra_sd), NUM(R, ra_max_sd_idx)});
     });
 }
 
@@ -254,12 +252,28 @@ void swap_dattr(const swap_image &img, size_t first, uint32_t count, const swap_
         swap_value(img, rec + offsetof(R, ra_min_value), rtype, b.sbase);
         swap_value(img, rec + offsetof(R, ra_max_value), rtype, b.sbase);
         swap_spots(img, rec,
-                   {NUM(R, ra_data_type), NUM(R, ra_var_type), NUM(R, ra_cb_ID), NUM(R, ra_props), REF(R, u_ra_name),
-                    REF(R, u_ra_vclass), REF(R, u_ra_next_in_vclass), REF(R, u_ra_variety_list),
-                    REF(R, u_ra_valid_vals), REF(R, u_ra_sd), REF(R, u_ra_express), REF(R, u_ra_rearm_expr),
-                    REF(R, u_ra_XAV_name), NUM(R, ra_dscr_msgid), NUM(R, ra_disp_msgid), NUM(R, ra_group_msgid),
-                    NUM(R, ra_group_id), NUM(R, ra_attr_id), NUM(R, ra_max_sd_idx), NUM(R, ra_expr_desc),
-                    NUM(R, ra_rearm_desc), NUM(R, ra_range_desc)});
+                   {NUM(R, ra_data_type),
+                    NUM(R, ra_var_type),
+                    NUM(R, ra_cb_ID),
+                    NUM(R, ra_props),
+                    REF(R, u_ra_name),
+                    REF(R, u_ra_vclass),
+                    REF(R, u_ra_next_in_vclass),
+                    REF(R, u_ra_variety_list),
+                    REF(R, u_ra_valid_vals),
+                    REF(R, u_ra_sd),
+                    REF(R, u_ra_express),
+                    REF(R, u_ra_rearm_expr),
+                    REF(R, u_ra_XAV_name),
+                    NUM(R, ra_dscr_msgid),
+                    NUM(R, ra_disp_msgid),
+                    NUM(R, ra_group_msgid),
+                    NUM(R, ra_group_id),
+                    NUM(R, ra_attr_id),
+                    NUM(R, ra_max_sd_idx),
+                    NUM(R, ra_expr_desc),
+                    NUM(R, ra_rearm_desc),
+                    NUM(R, ra_range_desc)});
     });
 }
 
@@ -302,12 +316,12 @@ namespace {
 void swap_class_record(const swap_image &img, size_t rec) {
     using R = rsrc_class_t;
     swap_spots(img, rec, {NUM(R, rc_cb_ID), NUM(R, rc_props), REF(R, u_rc_name)});
-    swap_run(img, rec + offsetof(R, u_rc_alias), 19, 4, sizeof(cdb_ref_t));   // u_rc_alias .. u_rc_strings
-    swap_run(img, rec + offsetof(R, rc_num_pattrsC), 8, 2, sizeof(uint16_t)); // the counts
+    swap_run(img, rec + offsetof(R, u_rc_alias), 19, 4, sizeof(cdb_ref_t));    // u_rc_alias .. u_rc_strings
+    swap_run(img, rec + offsetof(R, rc_num_pattrsC), 8, 2, sizeof(uint16_t));  // the counts
     swap_run(img, rec + offsetof(R, rc_varlist_size), 6, 4, sizeof(uint32_t)); // sizes and templates
-    swap_spots(img, rec,
-               {NUM(R, rc_class_id), NUM(R, rc_dscr_msgid), NUM(R, rc_disp_msgid), NUM(R, rc_locator),
-                NUM(R, rc_version)});
+    swap_spots(
+        img, rec,
+        {NUM(R, rc_class_id), NUM(R, rc_dscr_msgid), NUM(R, rc_disp_msgid), NUM(R, rc_locator), NUM(R, rc_version)});
 }
 
 // A class table of records: where its reference and its count are, and its walker.
@@ -358,27 +372,19 @@ void swap_var_class_dsect(const swap_image &img, size_t rec) {
 
 void swap_cmmap_dsect(const swap_image &img, size_t rec) {
     using R = rsrc_cmmap_t;
-    swap_spots(img, rec,
-               {NUM(R, rcm_cb_ID), NUM(R, rcm_class_ID), NUM(R, rcm_rm_ID), REF(R, u_rcm_msg_file),
-                REF(R, u_rcm_strings)});
-    swap_run(img, rec + offsetof(R, rcm_dscr_msg_set), 8, 2, sizeof(uint16_t));     // .. rcm_num_ctx_tmplts
+    swap_spots(
+        img, rec,
+        {NUM(R, rcm_cb_ID), NUM(R, rcm_class_ID), NUM(R, rcm_rm_ID), REF(R, u_rcm_msg_file), REF(R, u_rcm_strings)});
+    swap_run(img, rec + offsetof(R, rcm_dscr_msg_set), 8, 2, sizeof(uint16_t));    // .. rcm_num_ctx_tmplts
     swap_run(img, rec + offsetof(R, rcm_static_contexts), 4, 4, sizeof(uint32_t)); // .. rcm_ctx_tmplts
 }
 
 void swap_dsect(const swap_image &img, uint32_t type, size_t rec) {
     switch (type) {
-    case CDB_DSECT_RSRC_MGR:
-        swap_mgr_dsect(img, rec);
-        break;
-    case CDB_DSECT_VAR_CLASS:
-        swap_var_class_dsect(img, rec);
-        break;
-    case CDB_DSECT_CLASS:
-        swap_class_dsect(img, rec);
-        break;
-    case CDB_DSECT_CMMAP:
-        swap_cmmap_dsect(img, rec);
-        break;
+    case CDB_DSECT_RSRC_MGR: swap_mgr_dsect(img, rec); break;
+    case CDB_DSECT_VAR_CLASS: swap_var_class_dsect(img, rec); break;
+    case CDB_DSECT_CLASS: swap_class_dsect(img, rec); break;
+    case CDB_DSECT_CMMAP: swap_cmmap_dsect(img, rec); break;
     default: // the compiler writes no other kind
         break;
     }

@@ -1,7 +1,7 @@
 // Growable tables: named, zero-filled blocks to which items are only appended
 // and which are referred to by offsets, because a block moves when it grows.
-#include <cerrno>
 #include <algorithm>
+#include <cerrno>
 #include <cstdlib>
 #include <new>
 
@@ -134,4 +134,3 @@ zu_uint32_t table_arena::add_to_tbl(tbl *tp, const void *val, size_t len) {
     memcpy_8_rounded(p, val, len);
     return zu_uint32_t(p - tp->tbl_base);
 }
-

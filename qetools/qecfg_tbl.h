@@ -102,7 +102,7 @@ class table_arena {
     std::vector<std::unique_ptr<void, free_block>> blocks_;
     char *chunk_next_ = nullptr;
     size_t chunk_left_ = 0;
-    std::deque<tbl> tables_;      // stable addresses
+    std::deque<tbl> tables_;       // stable addresses
     std::vector<tbl *> free_tbls_; // given back empty
 };
 

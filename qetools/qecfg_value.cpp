@@ -236,18 +236,12 @@ int str_to_zu(table_arena &arena, zu_value_t *zu_out, zu_data_type_t zu_type, co
     if (!str_in || *str_in == '\0')
         return -1;
     switch (scalar_zu(zu_type)) {
-    case ZU_INT32:
-        return convert_int32(str_in, zu_out);
-    case ZU_UINT32:
-        return convert_uint32(str_in, zu_out);
-    case ZU_INT64:
-        return convert_int64(str_in, zu_out);
-    case ZU_UINT64:
-        return convert_uint64(str_in, zu_out);
-    case ZU_FLOAT32:
-        return convert_float32(str_in, zu_out);
-    case ZU_FLOAT64:
-        return convert_float64(str_in, zu_out);
+    case ZU_INT32: return convert_int32(str_in, zu_out);
+    case ZU_UINT32: return convert_uint32(str_in, zu_out);
+    case ZU_INT64: return convert_int64(str_in, zu_out);
+    case ZU_UINT64: return convert_uint64(str_in, zu_out);
+    case ZU_FLOAT32: return convert_float32(str_in, zu_out);
+    case ZU_FLOAT64: return convert_float64(str_in, zu_out);
     case ZU_CHAR_PTR: {
         size_t size = std::strlen(str_in) + 1;
         zu_out->ptr_char = static_cast<char *>(std::memcpy(arena.cfg_malloc(size), str_in, size));
@@ -263,8 +257,7 @@ int str_to_zu(table_arena &arena, zu_value_t *zu_out, zu_data_type_t zu_type, co
         zu_out->ptr_binary = reinterpret_cast<zu_binary_t *>(image);
         return 0;
     }
-    default:
-        return -1;
+    default: return -1;
     }
 }
 

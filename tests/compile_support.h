@@ -43,9 +43,8 @@ class captured_stream {
 
 // Compiles `source` in memory, as a source named "input.src" whose unnamed
 // class is named after `out_name`; `setup` may change the options.
-template <typename F = void (*)(qecfg::options &)>
-compile_result compile_text(const std::string &source, F setup = [](qecfg::options &) {},
-                            const std::string &out_name = "out.cdef") {
+template <typename F = void (*)(qecfg::options &)> compile_result compile_text(
+    const std::string &source, F setup = [](qecfg::options &) {}, const std::string &out_name = "out.cdef") {
     captured_stream so, se;
     qecfg::options opt;
     opt.output_name = out_name;
@@ -72,7 +71,9 @@ inline uint32_t u32_at(const std::string &b, size_t off) {
         v = (v << 8) | uint8_t(b.at(off + i));
     return v;
 }
-inline uint16_t u16_at(const std::string &b, size_t off) { return uint16_t(uint8_t(b.at(off)) | uint8_t(b.at(off + 1)) << 8); }
+inline uint16_t u16_at(const std::string &b, size_t off) {
+    return uint16_t(uint8_t(b.at(off)) | uint8_t(b.at(off + 1)) << 8);
+}
 
 // Without a variable class the class dsect is the first: behind the 80-byte
 // header and three 16-byte anchors (class, manager, map).

@@ -14,9 +14,10 @@ std::string big_source(int attrs, int actions) {
     for (int i = 0; i < attrs; i++) {
         std::string n = std::to_string(i);
         const char *kind = i % 2 ? "PersistentClassAttribute" : "PersistentResourceAttribute";
-        s += std::string(kind) + "\n    Name=attribute_number_" + n + "\n    Description=1\n    DisplayName=2\n    Id=" + n +
-             "\n    DataType=StringArray\n    VarietyRange=1," + n + "\n    VarietyRange=2,3\n    ValidValue=a" + n +
-             ",b\n    ValidValue=c\n    DefaultValue=first_" + n + "\n    DefaultValue=second\n";
+        s += std::string(kind) + "\n    Name=attribute_number_" + n +
+             "\n    Description=1\n    DisplayName=2\n    Id=" + n + "\n    DataType=StringArray\n    VarietyRange=1," +
+             n + "\n    VarietyRange=2,3\n    ValidValue=a" + n + ",b\n    ValidValue=c\n    DefaultValue=first_" + n +
+             "\n    DefaultValue=second\n";
         s += "DynamicResourceAttribute\n    Name=d" + n + "\n    Description=1\n    DisplayName=2\n    Id=" + n +
              "\n    DataType=SD\n    VariableType=Quantity\n    VarietyRange=1,1\n"
              "DAttrSDDefinition\n    ElementName=e\n    Description=1\n    DisplayName=2\n    ElementIndex=0\n"

@@ -51,7 +51,7 @@ TEST_F(Place, StructuredValueBuiltWhileTheTableGrowsKeepsEveryElement) {
     for (int i = 0; i < n; i++) {
         a = body_cursor{};
         ASSERT_EQ(copy_this_sd_type(c, value_slot::at(field), ZU_RSRC_HANDLE_PTR_ARRAY, DFLT_DEFAULT, st, &a, &sda,
-                                      &sde, n, ZU_SD_PTR),
+                                    &sde, n, ZU_SD_PTR),
                   0);
     }
     uint32_t first_array = 8 + 16 * n;

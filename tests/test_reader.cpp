@@ -31,7 +31,7 @@ TEST(Reader, CommentAfterANumberIsCut) {
 
 TEST(Reader, CommentsAndQuotesInTheValue) {
     EXPECT_EQ(class_name_with("    Name=\"a#b\"   "), "a#b");            // '#' inside quotes, blanks stripped
-    EXPECT_EQ(class_name_with("    Name=ab # the name"), "ab");           // comment after the value
+    EXPECT_EQ(class_name_with("    Name=ab # the name"), "ab");          // comment after the value
     EXPECT_EQ(class_name_with("    Name=\"x//y\" // the name"), "x//y"); // '//' inside quotes
     EXPECT_EQ(class_name_with("    Name=x/y /* z"), "x/y");              // '/*' needs no '*/'
     EXPECT_EQ(class_name_with("    Name=Test.Class\r"), "Test.Class\r"); // a carriage return is text

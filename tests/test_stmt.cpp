@@ -9,8 +9,9 @@ namespace {
 constexpr size_t FIRST = CLASS + sizeof(rsrc_class_t); // the first record behind the class record
 
 std::string pattr(const std::string &extra_required, const std::string &optional = "") {
-    return BASE_SOURCE + "PersistentResourceAttribute\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=1\n"
-                         "    DataType=Int32\n    VarietyRange=1,1\n" +
+    return BASE_SOURCE +
+           "PersistentResourceAttribute\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=1\n"
+           "    DataType=Int32\n    VarietyRange=1,1\n" +
            extra_required + optional;
 }
 
@@ -24,10 +25,10 @@ std::string stored_name(const std::string &statement) {
 }
 
 TEST(Statement, ValueSyntax) {
-    EXPECT_EQ(stored_name("Name= a b"), " a b");             // blanks after '=' are kept
+    EXPECT_EQ(stored_name("Name= a b"), " a b");               // blanks after '=' are kept
     EXPECT_EQ(stored_name("Name=\"a \"b\" c\""), "a \"b\" c"); // inner quotes stay
-    EXPECT_EQ(stored_name("Name=  \"x y\""), "x y");         // quotes after blanks
-    EXPECT_EQ(stored_name("Name=a=b"), "a=b");               // the first '=' ends the name
+    EXPECT_EQ(stored_name("Name=  \"x y\""), "x y");           // quotes after blanks
+    EXPECT_EQ(stored_name("Name=a=b"), "a=b");                 // the first '=' ends the name
 }
 
 TEST(Statement, IntegersAreConvertedLikeStrtolInBaseZero) {
@@ -80,8 +81,8 @@ TEST(Statement, VarietiesInStatementOrder) {
 }
 
 TEST(Statement, ValidValuesAndDisplayNames) {
-    compile_result r =
-        compile_text(pattr("", "    ValidValue=5\n    ValidValue=1,9\n    ValueDisplayName=6\n    ValueDisplayName=7\n"));
+    compile_result r = compile_text(
+        pattr("", "    ValidValue=5\n    ValidValue=1,9\n    ValueDisplayName=6\n    ValueDisplayName=7\n"));
     ASSERT_EQ(r.message, "");
     size_t vv = CLASS + u32_at(r.cdb, CLASS + 152) + u32_at(r.cdb, FIRST + 48);
     EXPECT_EQ(u32_at(r.cdb, vv), 0x43444235u);
@@ -95,8 +96,9 @@ TEST(Statement, ValidValuesAndDisplayNames) {
 }
 
 std::string action(const std::string &optional) {
-    return BASE_SOURCE + "ResourceAction\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=4\n"
-                         "    VarietyRange=1,1\n" +
+    return BASE_SOURCE +
+           "ResourceAction\n    Name=a\n    Description=1\n    DisplayName=2\n    Id=4\n"
+           "    VarietyRange=1,1\n" +
            optional;
 }
 

@@ -59,7 +59,6 @@ struct int_case {
 // Test names show the value text, not the bytes of the case.
 void PrintTo(const int_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
 
-
 class ValueInteger : public ValueConvert, public ::testing::WithParamInterface<int_case> {};
 
 TEST_P(ValueInteger, AcceptsExactlyTheDecimalTextInRange) {
@@ -91,18 +90,17 @@ INSTANTIATE_TEST_SUITE_P(
         int_case{ZU_INT64, "9223372036854775808", BAD, 0}, int_case{ZU_INT64, "-9223372036854775809", BAD, 0},
         int_case{ZU_UINT64, "18446744073709551615", OK, 0xFFFFFFFFFFFFFFFF},
         int_case{ZU_UINT64, "-1", OK, 0xFFFFFFFFFFFFFFFF}, int_case{ZU_UINT64, "18446744073709551616", BAD, 0},
-        int_case{ZU_UINT64, "-18446744073709551616", BAD, 0},
-        int_case{ZU_INT32_ARRAY, "-5", OK, 0xFFFFFFFB}, int_case{ZU_UINT64_ARRAY, "7", OK, 7}));
+        int_case{ZU_UINT64, "-18446744073709551616", BAD, 0}, int_case{ZU_INT32_ARRAY, "-5", OK, 0xFFFFFFFB},
+        int_case{ZU_UINT64_ARRAY, "7", OK, 7}));
 
-INSTANTIATE_TEST_SUITE_P(
-    Notation, ValueInteger,
-    ::testing::Values(int_case{ZU_INT32, " 10", OK, 10}, int_case{ZU_INT32, "\t+10", OK, 10},
-                      int_case{ZU_INT32, "010", OK, 10}, int_case{ZU_UINT64, "010", OK, 10},
-                      int_case{ZU_INT32, "10 ", BAD, 0}, int_case{ZU_UINT32, "10 ", BAD, 0},
-                      int_case{ZU_INT64, "0x10", BAD, 0}, int_case{ZU_UINT64, "0x10", BAD, 0},
-                      int_case{ZU_INT32, "1e3", BAD, 0}, int_case{ZU_INT32, "", BAD, 0},
-                      int_case{ZU_INT32, " ", BAD, 0}, int_case{ZU_UINT32, "-", BAD, 0},
-                      int_case{ZU_INT64, "abc", BAD, 0}, int_case{ZU_UINT32, "--1", BAD, 0}));
+INSTANTIATE_TEST_SUITE_P(Notation, ValueInteger,
+                         ::testing::Values(int_case{ZU_INT32, " 10", OK, 10}, int_case{ZU_INT32, "\t+10", OK, 10},
+                                           int_case{ZU_INT32, "010", OK, 10}, int_case{ZU_UINT64, "010", OK, 10},
+                                           int_case{ZU_INT32, "10 ", BAD, 0}, int_case{ZU_UINT32, "10 ", BAD, 0},
+                                           int_case{ZU_INT64, "0x10", BAD, 0}, int_case{ZU_UINT64, "0x10", BAD, 0},
+                                           int_case{ZU_INT32, "1e3", BAD, 0}, int_case{ZU_INT32, "", BAD, 0},
+                                           int_case{ZU_INT32, " ", BAD, 0}, int_case{ZU_UINT32, "-", BAD, 0},
+                                           int_case{ZU_INT64, "abc", BAD, 0}, int_case{ZU_UINT32, "--1", BAD, 0}));
 
 // ------------------------------------------------------------------ floats
 struct float_case {
@@ -113,7 +111,6 @@ struct float_case {
 };
 // Test names show the value text, not the bytes of the case.
 void PrintTo(const float_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
-
 
 class ValueFloat : public ValueConvert, public ::testing::WithParamInterface<float_case> {};
 
@@ -196,7 +193,6 @@ struct binary_case {
 // Test names show the value text, not the bytes of the case.
 void PrintTo(const binary_case &k, std::ostream *os) { *os << '"' << k.text << '"'; }
 
-
 class ValueBinary : public ValueConvert, public ::testing::WithParamInterface<binary_case> {};
 
 TEST_P(ValueBinary, BuildsTheImage) {
@@ -210,22 +206,26 @@ TEST_P(ValueBinary, BuildsTheImage) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Hex, ValueBinary,
-    ::testing::Values(binary_case{"0x", OK, ""}, binary_case{"0x00ff10", OK, string("\x00\xff\x10", 3)},
-                      binary_case{"0xAbCd", OK, "\xab\xcd"}, binary_case{"0x0", BAD, ""},
-                      binary_case{"0X0A", BAD, ""}, binary_case{"0", BAD, ""}, binary_case{"012", BAD, ""},
-                      binary_case{"0xg0", BAD, ""}, binary_case{"0x0 ", BAD, ""}, binary_case{"", BAD, ""}));
+INSTANTIATE_TEST_SUITE_P(Hex, ValueBinary,
+                         ::testing::Values(binary_case{"0x", OK, ""},
+                                           binary_case{"0x00ff10", OK, string("\x00\xff\x10", 3)},
+                                           binary_case{"0xAbCd", OK, "\xab\xcd"}, binary_case{"0x0", BAD, ""},
+                                           binary_case{"0X0A", BAD, ""}, binary_case{"0", BAD, ""},
+                                           binary_case{"012", BAD, ""}, binary_case{"0xg0", BAD, ""},
+                                           binary_case{"0x0 ", BAD, ""}, binary_case{"", BAD, ""}));
 
-INSTANTIATE_TEST_SUITE_P(
-    Escapes, ValueBinary,
-    ::testing::Values(binary_case{"abc", OK, "abc"}, binary_case{"ab\\101\\\\c", OK, "abA\\c"},
-                      binary_case{"\\377", OK, "\xff"}, binary_case{"\\1234", OK, "S4"},
-                      binary_case{"\\08", OK, string("\0" "8", 2)}, binary_case{"\\ 7x", OK, "\x07x"},
-                      binary_case{"\\-1", OK, "\xff"}, binary_case{"\\+12", OK, "\n"},
-                      binary_case{"x\\\\", OK, "x\\"}, binary_case{" 0x1", OK, " 0x1"},
-                      binary_case{"\\400", BAD, ""}, binary_case{"\\9", BAD, ""}, binary_case{"ab\\", BAD, ""},
-                      binary_case{"\\   7", BAD, ""}, binary_case{"\\x41", BAD, ""}));
+INSTANTIATE_TEST_SUITE_P(Escapes, ValueBinary,
+                         ::testing::Values(binary_case{"abc", OK, "abc"}, binary_case{"ab\\101\\\\c", OK, "abA\\c"},
+                                           binary_case{"\\377", OK, "\xff"}, binary_case{"\\1234", OK, "S4"},
+                                           binary_case{"\\08", OK,
+                                                       string("\0"
+                                                              "8",
+                                                              2)},
+                                           binary_case{"\\ 7x", OK, "\x07x"}, binary_case{"\\-1", OK, "\xff"},
+                                           binary_case{"\\+12", OK, "\n"}, binary_case{"x\\\\", OK, "x\\"},
+                                           binary_case{" 0x1", OK, " 0x1"}, binary_case{"\\400", BAD, ""},
+                                           binary_case{"\\9", BAD, ""}, binary_case{"ab\\", BAD, ""},
+                                           binary_case{"\\   7", BAD, ""}, binary_case{"\\x41", BAD, ""}));
 
 // The converters write no more than binary_image_size says, even when called
 // directly on texts that str_to_zu would never hand them.
@@ -248,11 +248,11 @@ TEST(ValueBinaryDirect, RefusesBadTextsWithinTheImageSize) {
 // ------------------------------------------------------------- type names
 TEST(ValueNames, DataTypeNamesAreExact) {
     const std::pair<const char *, uint32_t> names[] = {
-        {"None", 1},          {"Int32", 2},         {"UInt32", 3},       {"Int64", 4},         {"UInt64", 5},
-        {"Float32", 6},       {"Float64", 7},       {"String", 8},       {"Binary", 9},        {"RH", 10},
-        {"SD", 11},           {"SBS", 12},          {"Int32Array", 13},  {"UInt32Array", 14},  {"Int64Array", 15},
-        {"UInt64Array", 16},  {"Float32Array", 17}, {"Float64Array", 18}, {"StringArray", 19}, {"BinaryArray", 20},
-        {"RHArray", 21},      {"SDArray", 22}};
+        {"None", 1},         {"Int32", 2},         {"UInt32", 3},        {"Int64", 4},        {"UInt64", 5},
+        {"Float32", 6},      {"Float64", 7},       {"String", 8},        {"Binary", 9},       {"RH", 10},
+        {"SD", 11},          {"SBS", 12},          {"Int32Array", 13},   {"UInt32Array", 14}, {"Int64Array", 15},
+        {"UInt64Array", 16}, {"Float32Array", 17}, {"Float64Array", 18}, {"StringArray", 19}, {"BinaryArray", 20},
+        {"RHArray", 21},     {"SDArray", 22}};
     for (auto &[name, dt] : names)
         EXPECT_EQ(strToZuDt(name), dt) << name;
     for (const char *bad : {"UNKNOWN", "int32", "Int32 ", " Int32", "Int", "", "Int32Arrayx"})
@@ -275,8 +275,8 @@ TEST(ValueNames, VariableTypeNamesAreExact) {
 }
 
 TEST(ValueNames, ArrayTypesAndTheirElements) {
-    const uint32_t scalar_of[][2] = {{0, 0},   {8, 8},   {11, 11}, {12, 12}, {13, 2},
-                                     {19, 8},  {22, 11}, {23, 23}, {40, 40}};
+    const uint32_t scalar_of[][2] = {{0, 0},  {8, 8},   {11, 11}, {12, 12}, {13, 2},
+                                     {19, 8}, {22, 11}, {23, 23}, {40, 40}};
     for (auto &[dt, el] : scalar_of)
         EXPECT_EQ(scalar_zu(static_cast<zu_data_type_t>(dt)), el) << dt;
     for (uint32_t dt : {0u, 12u, 23u, 0xFFFFFFFFu})
@@ -288,8 +288,8 @@ TEST(ValueNames, ArrayTypesAndTheirElements) {
 // ------------------------------------------------------------ quotes
 TEST(ValueQuotes, StripsOnlyAMatchedPair) {
     const std::pair<const char *, const char *> stripped[] = {
-        {"  \"abc\"", "abc"}, {"\t\"x\"", "x"},           {"\"", ""},          {" \t\"", ""},
-        {"\"\"", ""},         {"\"a \"b\" c\"", "a \"b\" c"}, {"\"a\\b\"", "a\\b"}};
+        {"  \"abc\"", "abc"},           {"\t\"x\"", "x"},    {"\"", ""}, {" \t\"", ""}, {"\"\"", ""},
+        {"\"a \"b\" c\"", "a \"b\" c"}, {"\"a\\b\"", "a\\b"}};
     for (auto &[in, out] : stripped) {
         string buf = in;
         const char *r = strip_quotes(buf.data());
@@ -310,12 +310,23 @@ TEST(ValueQuotes, StripsOnlyAMatchedPair) {
 
 // ------------------------------------------------------------ versions
 TEST(ValueVersion, PacksFourParts) {
-    const std::pair<const char *, uint32_t> versions[] = {
-        {"1.2.3.4", 0x01020304},   {"2.1", 0x02010000},        {"1.2.3.4.5", 0x01020304}, {"", 0},
-        {"1.2.3.300", 0x0102032C}, {"1..3", 0x01000300},       {" 1. +2.x.7", 0x01020007}, {"-1", 0xFF000000},
-        {"4294967297", 0x01000000}, {"1.2.3.65536", 0x01030300}, {"1.256.3", 0x01000300},   {"1.2.3.4x.9", 0x01020304},
-        {".", 0},                  {"7.", 0x07000000},         {"1.2.3.-1", 0xFFFFFFFF},
-        {"0.256.3", 0x00000300},   {"0.0.256.1", 0x00000001}};
+    const std::pair<const char *, uint32_t> versions[] = {{"1.2.3.4", 0x01020304},
+                                                          {"2.1", 0x02010000},
+                                                          {"1.2.3.4.5", 0x01020304},
+                                                          {"", 0},
+                                                          {"1.2.3.300", 0x0102032C},
+                                                          {"1..3", 0x01000300},
+                                                          {" 1. +2.x.7", 0x01020007},
+                                                          {"-1", 0xFF000000},
+                                                          {"4294967297", 0x01000000},
+                                                          {"1.2.3.65536", 0x01030300},
+                                                          {"1.256.3", 0x01000300},
+                                                          {"1.2.3.4x.9", 0x01020304},
+                                                          {".", 0},
+                                                          {"7.", 0x07000000},
+                                                          {"1.2.3.-1", 0xFFFFFFFF},
+                                                          {"0.256.3", 0x00000300},
+                                                          {"0.0.256.1", 0x00000001}};
     for (auto &[text, packed] : versions) {
         uint32_t n = 0xDEADBEEF;
         EXPECT_EQ(ver_str_convert(text, &n), 0);
@@ -328,9 +339,11 @@ const props_t test_props[] = {{"Alpha", 0x1}, {"Beta", 0x2}, {"Beta", 0x40}, {"G
 constexpr int TEST_PROPS_SEARCHED = 4; // "Hidden" lies beyond the searched entries
 
 TEST_F(ValueConvert, PropertiesAddBits) {
-    const std::tuple<uint32_t, const char *, uint32_t> lists[] = {
-        {0x100, "Alpha,,Gamma", 0x105}, {0, ",Alpha,", 0x1}, {0x100, ",,,", 0x100},
-        {0, "Beta", 0x2},               {0, "Alpha,Alpha", 0x1}};
+    const std::tuple<uint32_t, const char *, uint32_t> lists[] = {{0x100, "Alpha,,Gamma", 0x105},
+                                                                  {0, ",Alpha,", 0x1},
+                                                                  {0x100, ",,,", 0x100},
+                                                                  {0, "Beta", 0x2},
+                                                                  {0, "Alpha,Alpha", 0x1}};
     for (auto &[before, text, after] : lists) {
         uint32_t dest = before;
         string buf = text;

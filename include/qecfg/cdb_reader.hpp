@@ -188,7 +188,8 @@ class database {
     // The class of dsect i, filled into `out`; false when dsect i is no class.
     bool class_at(uint32_t i, std::optional<resource_class> &out) const {
         cdb_class_t c;
-        if (cdb_class_at(&db_, i, &c) != CDB_OK) return false;
+        if (cdb_class_at(&db_, i, &c) != CDB_OK)
+            return false;
         out.emplace(c);
         return true;
     }

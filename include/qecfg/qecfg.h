@@ -57,8 +57,8 @@ struct options {
 // Where the source comes from. The bytes of an in-memory source are not
 // copied: they must stay valid for the call.
 struct source {
-    std::string name;       // the path, or the name messages give an in-memory source
-    std::string_view text;  // the source itself, when in_memory
+    std::string name;      // the path, or the name messages give an in-memory source
+    std::string_view text; // the source itself, when in_memory
     bool in_memory = false;
 
     static source file(std::string path) { return source{std::move(path), {}, false}; }

@@ -20,12 +20,15 @@ struct buf {
     std::vector<uint8_t> b;
 
     void put(size_t off, uint64_t v, unsigned width) {
-        if (b.size() < off + width) b.resize(off + width);
-        for (unsigned i = 0; i < width; i++) b[off + i] = uint8_t(v >> 8 * (big ? width - 1 - i : i));
+        if (b.size() < off + width)
+            b.resize(off + width);
+        for (unsigned i = 0; i < width; i++)
+            b[off + i] = uint8_t(v >> 8 * (big ? width - 1 - i : i));
     }
     uint64_t get(size_t off, unsigned width) const {
         uint64_t v = 0;
-        for (unsigned i = 0; i < width; i++) v |= uint64_t(b[off + i]) << 8 * (big ? width - 1 - i : i);
+        for (unsigned i = 0; i < width; i++)
+            v |= uint64_t(b[off + i]) << 8 * (big ? width - 1 - i : i);
         return v;
     }
     size_t add(size_t n) {
@@ -36,7 +39,8 @@ struct buf {
     void pad8() { b.resize((b.size() + 7) / 8 * 8); }
     uint32_t text(const std::string &s) {
         size_t off = add(s.size() + 1);
-        for (size_t i = 0; i < s.size(); i++) b[off + i] = uint8_t(s[i]);
+        for (size_t i = 0; i < s.size(); i++)
+            b[off + i] = uint8_t(s[i]);
         pad8();
         return uint32_t(off);
     }
@@ -56,7 +60,8 @@ struct test_class {
         strings.big = vl.big = vv.big = sd.big = big;
         rec.put(0, 0x43444231, 4);
         rec.put(8, strings.text(name), 4);
-        for (size_t f : {16, 56, 64, 72, 80, 88}) rec.put(f, NONE, 4);
+        for (size_t f : {16, 56, 64, 72, 80, 88})
+            rec.put(f, NONE, 4);
         rec.put(214, 0xFFFF, 2);
     }
 
@@ -79,7 +84,8 @@ struct test_class {
     uint32_t valid_values(const std::vector<std::array<uint32_t, 3>> &v) {
         uint32_t off = list(vv, 0x43444235, 24, uint32_t(v.size()));
         for (size_t i = 0; i < v.size(); i++)
-            for (size_t k = 0; k < 3; k++) vv.put(off + 8 + 24 * i + 8 * k, v[i][k], k < 2 ? 4 : 2);
+            for (size_t k = 0; k < 3; k++)
+                vv.put(off + 8 + 24 * i + 8 * k, v[i][k], k < 2 ? 4 : 2);
         return off;
     }
     // A structured-data definition of (name, data type) elements.
@@ -106,7 +112,8 @@ struct test_class {
     uint32_t array(const std::vector<uint64_t> &elements, unsigned width) {
         uint32_t off = uint32_t(strings.add(8 + 8 * elements.size()));
         strings.put(off, elements.size(), 4);
-        for (size_t i = 0; i < elements.size(); i++) strings.put(off + 8 + 8 * i, elements[i], width);
+        for (size_t i = 0; i < elements.size(); i++)
+            strings.put(off + 8 + 8 * i, elements[i], width);
         return off;
     }
     // A structured value of (data type, 32-bit value) elements.
@@ -139,9 +146,11 @@ struct test_class {
         buf &r = (of_class ? dattrsC : dattrs).emplace_back(record(big, DATTR));
         r.put(0, of_class ? 0x43444238 : 0x43444261, 4);
         r.put(8, strings.text(name), 4);
-        if (dt == 2 || dt == 3) r.put(48, 100, 4);
+        if (dt == 2 || dt == 3)
+            r.put(48, 100, 4);
         r.put(56, varieties({{1, 1}}), 4);
-        for (size_t f : {64, 72, 80, 88}) r.put(f, NONE, 4);
+        for (size_t f : {64, 72, 80, 88})
+            r.put(f, NONE, 4);
         r.put(104, dt, 4);
         r.put(118, 255, 2);
         r.put(120, uint32_t(id), 4);
@@ -169,7 +178,8 @@ struct test_class {
         for (size_t i = 0; i < 6; i++) {
             d.put(ref_at[i], d.b.size(), 4);
             d.put(168 + 2 * i, tables[i]->size(), 2);
-            for (const buf &r : *tables[i]) d.b.insert(d.b.end(), r.b.begin(), r.b.end());
+            for (const buf &r : *tables[i])
+                d.b.insert(d.b.end(), r.b.begin(), r.b.end());
         }
         const std::pair<const buf *, std::pair<size_t, size_t>> lists[] = {
             {&vl, {128, 184}}, {&sd, {144, 192}}, {&vv, {152, 196}}};
@@ -200,7 +210,8 @@ struct test_var_class {
 inline void fix_checksum(std::vector<uint8_t> &image, bool big) {
     buf f{big, std::move(image)};
     uint32_t sum = uint32_t(f.get(0, 4));
-    for (size_t off = 8; off + 4 <= f.b.size(); off += 4) sum ^= uint32_t(f.get(off, 4));
+    for (size_t off = 8; off + 4 <= f.b.size(); off += 4)
+        sum ^= uint32_t(f.get(off, 4));
     f.put(4, sum, 4);
     image = std::move(f.b);
 }
@@ -211,7 +222,8 @@ inline std::vector<uint8_t> image(const std::vector<test_class> &classes, const 
                                   const std::vector<test_var_class> &vcs = {}) {
     bool big = classes.at(0).big;
     std::vector<std::pair<uint32_t, std::vector<uint8_t>>> dsects;
-    for (const test_class &c : classes) dsects.emplace_back(5, c.dsect());
+    for (const test_class &c : classes)
+        dsects.emplace_back(5, c.dsect());
     // Each string table is rounded from its own start.
     auto with_strings = [](buf r, const buf &strings) {
         r.b.insert(r.b.end(), strings.b.begin(), strings.b.end());
@@ -238,7 +250,8 @@ inline std::vector<uint8_t> image(const std::vector<test_class> &classes, const 
         r.put(24, v.ids.size(), 4);
         r.put(28, strings.b.size(), 4);
         r.b.insert(r.b.end(), strings.b.begin(), strings.b.end());
-        for (uint32_t id : v.ids) r.put(r.b.size(), id, 4);
+        for (uint32_t id : v.ids)
+            r.put(r.b.size(), id, 4);
         r.pad8();
         dsects.emplace_back(4, r.b);
     }
@@ -246,7 +259,8 @@ inline std::vector<uint8_t> image(const std::vector<test_class> &classes, const 
     f.put(8, 0x666D7431, 4);
     f.put(24, dsects.size(), 4);
     const uint16_t sizes[] = {224, 60, 24, 40, 72, 136, 56, 48, 8};
-    for (size_t i = 0; i < 9; i++) f.put(32 + 2 * i, sizes[i], 2);
+    for (size_t i = 0; i < 9; i++)
+        f.put(32 + 2 * i, sizes[i], 2);
     for (size_t i = 0; i < dsects.size(); i++) {
         f.put(80 + 16 * i, dsects[i].first, 4);
         f.put(84 + 16 * i, f.b.size(), 4);

@@ -19,7 +19,8 @@ struct cli_result {
 std::string slurp(FILE *f) {
     std::rewind(f);
     std::string s;
-    for (int c; (c = std::fgetc(f)) != EOF;) s += char(c);
+    for (int c; (c = std::fgetc(f)) != EOF;)
+        s += char(c);
     std::fclose(f);
     return s;
 }
@@ -27,7 +28,8 @@ std::string slurp(FILE *f) {
 cli_result cli(std::vector<std::string> args) {
     args.insert(args.begin(), "cdbdump");
     std::vector<char *> argv;
-    for (std::string &a : args) argv.push_back(a.data());
+    for (std::string &a : args)
+        argv.push_back(a.data());
     FILE *out = std::tmpfile(), *err = std::tmpfile();
     int status = cdbdump_main(int(argv.size()), argv.data(), out, err);
     return cli_result{status, slurp(out), slurp(err)};
@@ -69,7 +71,8 @@ TEST(Cli, UsageErrorsExitWithTwo) {
         EXPECT_NE(r.err.find(message), std::string::npos) << r.err;
         EXPECT_TRUE(r.out.empty());
     }
-    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source | --header]"), std::string::npos);
+    EXPECT_NE(cli({}).err.find("usage: cdbdump [--check | --json | --annotate | --source | --header]"),
+              std::string::npos);
 }
 
 TEST(Cli, HelpAndVersion) {

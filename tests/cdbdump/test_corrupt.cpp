@@ -100,7 +100,8 @@ void exercise(const std::vector<uint8_t> &b, bool print) {
     annotation a = annotate_walk(b.data(), b.size());
     try {
         cdb_file f = verify(b.data(), b.size());
-        if (!print) return;
+        if (!print)
+            return;
         EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::json), to_json(to_tree(f)));
         EXPECT_EQ(cdbtest::streamed(b, tree_writer::style::text), to_text(to_tree(f)));
         (void)decompile(f);
@@ -118,7 +119,8 @@ TEST(Corruption, EachIsReportedWithItsMessageAndOffset) {
             SCOPED_TRACE(std::string(c.what) + (big ? ", big-endian" : ", little-endian"));
             probe p{cdbtest::buf{big, cdbtest::rich_image(big)}};
             size_t at = c.apply(p);
-            if (!c.keep_checksum) cdbtest::fix_checksum(p.f.b, big);
+            if (!c.keep_checksum)
+                cdbtest::fix_checksum(p.f.b, big);
             try {
                 verify(p.f.b.data(), p.f.b.size());
                 ADD_FAILURE() << "not caught";

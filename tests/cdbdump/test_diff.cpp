@@ -47,7 +47,8 @@ std::string edited(std::string s, const std::vector<std::pair<std::string, std::
     for (const auto &[from, to] : edits) {
         size_t at = s.find(from);
         EXPECT_NE(at, std::string::npos) << from;
-        for (; at != std::string::npos; at = s.find(from, at + to.size())) s.replace(at, from.size(), to);
+        for (; at != std::string::npos; at = s.find(from, at + to.size()))
+            s.replace(at, from.size(), to);
     }
     return s;
 }
@@ -64,43 +65,70 @@ const std::string errors_stanza = "    Id=4\n    DataType=Int32\n    VariableTyp
                                   "    VariableClass=Fast\n";
 
 const variant variants[] = {
-    {"description", {{"Description=13", "Description=99"}}, false,
+    {"description",
+     {{"Description=13", "Description=99"}},
+     false,
      "compatible: changed class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\" / description: 13 -> 99",
      "a description or display name changed"},
-    {"default", {{"DefaultValue=none", "DefaultValue=other"}}, false,
+    {"default",
+     {{"DefaultValue=none", "DefaultValue=other"}},
+     false,
      "compatible: changed class \"Diff.Disk\" / persistent_resource_attributes / \"Label\" / default_value: \"none\" "
      "-> \"other\"",
      "a default or range changed"},
-    {"range", {{"Range=0,100", "Range=0,50"}}, false,
+    {"range",
+     {{"Range=0,100", "Range=0,50"}},
+     false,
      "compatible: changed class \"Diff.Disk\" / dynamic_resource_attributes / \"Load\" / range / high: 100 -> 50",
      "a default or range changed"},
     {"attribute added",
      {{"ResourceAction\n", "PersistentResourceAttribute\n    Name=Extra\n    Description=1\n    DisplayName=2\n"
                            "    Id=9\n    DataType=Int64\n    VarietyRange=1,1\nResourceAction\n"}},
-     false, "compatible: added class \"Diff.Disk\" / persistent_resource_attributes / \"Extra\"", "an addition"},
+     false,
+     "compatible: added class \"Diff.Disk\" / persistent_resource_attributes / \"Extra\"",
+     "an addition"},
     {"variable id appended",
      {{"ResourceAction\n", "DynamicResourceAttribute\n    Name=Temp\n    Description=1\n    DisplayName=2\n    Id=9\n"
                            "    DataType=Int32\n    VariableType=Counter\n    VarietyRange=1,1\n"
                            "    VariableClass=Fast\nResourceAction\n"}},
-     false, "compatible: changed variable_class \"Fast\" / variable_ids: [3,4] -> [3,4,9]", "variable IDs were added"},
-    {"attribute removed", {{"    Name=Blocks\n", "    Name=Blocks2\n"}}, true,
-     "breaking: removed class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\"", "an attribute was removed"},
-    {"class removed", {{"    Name=Diff.Tape\n", "    Name=Diff.Tape2\n"}}, true, "breaking: removed class \"Diff.Tape\"",
+     false,
+     "compatible: changed variable_class \"Fast\" / variable_ids: [3,4] -> [3,4,9]",
+     "variable IDs were added"},
+    {"attribute removed",
+     {{"    Name=Blocks\n", "    Name=Blocks2\n"}},
+     true,
+     "breaking: removed class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\"",
+     "an attribute was removed"},
+    {"class removed",
+     {{"    Name=Diff.Tape\n", "    Name=Diff.Tape2\n"}},
+     true,
+     "breaking: removed class \"Diff.Tape\"",
      "a class was removed"},
-    {"action removed", {{"    Name=Reset\n", "    Name=Restart\n"}}, true,
-     "breaking: removed class \"Diff.Disk\" / resource_actions / \"Reset\"", "an action was removed"},
-    {"attribute id", {{"    Id=2\n", "    Id=7\n"}}, true,
+    {"action removed",
+     {{"    Name=Reset\n", "    Name=Restart\n"}},
+     true,
+     "breaking: removed class \"Diff.Disk\" / resource_actions / \"Reset\"",
+     "an action was removed"},
+    {"attribute id",
+     {{"    Id=2\n", "    Id=7\n"}},
+     true,
      "breaking: changed class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\" / id: 2 -> 7",
      "an attribute id changed"},
-    {"data type", {{"DataType=UInt32", "DataType=UInt64"}}, true,
+    {"data type",
+     {{"DataType=UInt32", "DataType=UInt64"}},
+     true,
      "breaking: changed class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\" / data_type: \"UInt32\" -> "
      "\"UInt64\"",
      "a data type changed"},
-    {"variable type", {{"VariableType=Counter", "VariableType=Quantity"}}, true,
+    {"variable type",
+     {{"VariableType=Counter", "VariableType=Quantity"}},
+     true,
      "breaking: changed class \"Diff.Disk\" / dynamic_resource_attributes / \"Errors\" / variable_type: \"Counter\" -> "
      "\"Quantity\"",
      "a variable type changed"},
-    {"scope", {{"ResourceAction", "ClassAction"}}, true,
+    {"scope",
+     {{"ResourceAction", "ClassAction"}},
+     true,
      "breaking: moved class \"Diff.Disk\" / resource_actions / \"Reset\": \"resource_actions\" -> \"class_actions\"",
      "class/resource scope changed"},
     {"persistence",
@@ -110,17 +138,28 @@ const variant variants[] = {
      "breaking: moved class \"Diff.Disk\" / persistent_resource_attributes / \"Blocks\": "
      "\"persistent_resource_attributes\" -> \"dynamic_resource_attributes\"",
      "persistence changed"},
-    {"sd element retyped", {{"ElementIndex=1\n    DataType=UInt64", "ElementIndex=1\n    DataType=Int32"}}, true,
+    {"sd element retyped",
+     {{"ElementIndex=1\n    DataType=UInt64", "ElementIndex=1\n    DataType=Int32"}},
+     true,
      "breaking: changed class \"Diff.Disk\" / define_sd / \"Size\" / data_type: \"UInt64\" -> \"Int32\"",
      "a structured-data element was retyped"},
-    {"sd element removed", {{"ElementName=Size", "ElementName=Bytes"}}, true,
-     "breaking: removed class \"Diff.Disk\" / define_sd / \"Size\"", "a structured-data element was removed"},
+    {"sd element removed",
+     {{"ElementName=Size", "ElementName=Bytes"}},
+     true,
+     "breaking: removed class \"Diff.Disk\" / define_sd / \"Size\"",
+     "a structured-data element was removed"},
     {"sd elements reordered",
-     {{"ElementName=Device", "ElementName=@"}, {"ElementName=Size", "ElementName=Device"}, {"ElementName=@", "ElementName=Size"}},
-     true, "breaking: reordered class \"Diff.Disk\" / define_sd: [\"Device\",\"Size\"] -> [\"Size\",\"Device\"]",
+     {{"ElementName=Device", "ElementName=@"},
+      {"ElementName=Size", "ElementName=Device"},
+      {"ElementName=@", "ElementName=Size"}},
+     true,
+     "breaking: reordered class \"Diff.Disk\" / define_sd: [\"Device\",\"Size\"] -> [\"Size\",\"Device\"]",
      "structured-data elements were reordered"},
-    {"variable id moved", {{errors_stanza, edited(errors_stanza, {{"Fast", "Slow"}})}}, true,
-     "breaking: changed variable_class \"Fast\" / variable_ids: [3,4] -> [3]", "a variable ID moved"},
+    {"variable id moved",
+     {{errors_stanza, edited(errors_stanza, {{"Fast", "Slow"}})}},
+     true,
+     "breaking: changed variable_class \"Fast\" / variable_ids: [3,4] -> [3]",
+     "a variable ID moved"},
 };
 } // namespace
 
@@ -181,12 +220,14 @@ TEST(Diff, JsonDocumentAndErrors) {
     std::string new_cdb = d.compile(edited(d.base, {{"DataType=UInt32", "DataType=UInt64"}}), "new.cdef", true);
     run_result json = d.cdbdump("--json --compat " + old_cdb + " " + new_cdb);
     EXPECT_EQ(json.status, 1);
-    for (const char *part : {"\"compatible\": false", "\"old\": \"UInt32\"", "\"new\": \"UInt64\"", "\"breaking\": true"})
+    for (const char *part :
+         {"\"compatible\": false", "\"old\": \"UInt32\"", "\"new\": \"UInt64\"", "\"breaking\": true"})
         EXPECT_NE(json.out.find(part), std::string::npos) << part << "\n" << json.out;
     // The path's dsect and item names are structured, not quoted inside strings.
     std::string compact;
     for (char ch : json.out)
-        if (ch != ' ' && ch != '\n') compact += ch;
+        if (ch != ' ' && ch != '\n')
+            compact += ch;
     EXPECT_NE(compact.find("\"path\":[{\"dsect\":\"class\",\"name\":\"Diff.Disk\"},\"persistent_resource_attributes\","
                            "{\"name\":\"Blocks\"},\"data_type\"]"),
               std::string::npos)
@@ -196,5 +237,6 @@ TEST(Diff, JsonDocumentAndErrors) {
     std::ofstream(d.path / "broken.cdef") << "not a CDB";
     const std::string bad[] = {"--diff " + old_cdb, "--diff " + old_cdb + " " + (d.path / "broken.cdef").string(),
                                "--compat " + old_cdb + " /nonexistent", "--diff --check " + old_cdb + " " + old_cdb};
-    for (const std::string &args : bad) EXPECT_EQ(d.cdbdump(args).status, 2) << args;
+    for (const std::string &args : bad)
+        EXPECT_EQ(d.cdbdump(args).status, 2) << args;
 }

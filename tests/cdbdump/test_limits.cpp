@@ -28,7 +28,8 @@ using cdbtest::read_text;
 using cdbtest::work_dir;
 
 std::string write_file(const work_dir &w, const std::string &name, const std::vector<uint8_t> &bytes) {
-    std::ofstream(w.path / name, std::ios::binary).write(reinterpret_cast<const char *>(bytes.data()), long(bytes.size()));
+    std::ofstream(w.path / name, std::ios::binary)
+        .write(reinterpret_cast<const char *>(bytes.data()), long(bytes.size()));
     return (w.path / name).string();
 }
 
@@ -70,7 +71,8 @@ std::string large_source(int classes, int attrs) {
         }
     }
     s << "ClassToManagerMapping\n    ResourceManager=Large.RM\n    FirstKey=1\n    LastKey=100\n";
-    for (int v = 0; v < 3; v++) s << "ResourceVariableClass\n    VariableClass=VC" << v << "\n";
+    for (int v = 0; v < 3; v++)
+        s << "ResourceVariableClass\n    VariableClass=VC" << v << "\n";
     return s.str();
 }
 
@@ -95,7 +97,8 @@ constexpr bool sanitized = false;
 // The bounds of README.md: --check the file plus 4 times its largest dsect
 // plus 8 MB; text and --json the file plus 6 times its largest dsect plus 16 MB.
 TEST(Limits, PeakMemoryStaysWithinTheDocumentedBound) {
-    if (sanitized) GTEST_SKIP() << "peak memory is not the program's own under the sanitizers";
+    if (sanitized)
+        GTEST_SKIP() << "peak memory is not the program's own under the sanitizers";
     const work_dir &w = large();
     long file_kb = long(fs::file_size(w.path / "large.cdef") / 1024);
     ASSERT_GT(file_kb, 4000); // a size at which a copy per byte would show
@@ -113,7 +116,8 @@ TEST(Limits, PeakMemoryStaysWithinTheDocumentedBound) {
 }
 
 TEST(Limits, MemoryExhaustionEndsWithAMessage) {
-    if (sanitized) GTEST_SKIP() << "the sanitizers need more address space than the limit leaves";
+    if (sanitized)
+        GTEST_SKIP() << "the sanitizers need more address space than the limit leaves";
     const work_dir &w = large();
     run_result r = shell(w, "ulimit -v 40000; " + dump + " --diff large.cdef large.cdef >/dev/null");
     EXPECT_EQ(r.status, 2) << r.err;
@@ -155,9 +159,10 @@ TEST(Limits, InputRefusedBeforeItIsRead) {
         {"(cat " + good + "; head -c 1000000 /dev/zero) | " + dump + " --json -",
          "(standard input): offset 0: cdb_hdr_length is " + length + ", but the file has more than " + length +
              " bytes after the length field\n"},
-        {"source.src", "source.src: offset 8: the format word reads 0x6e696665 little-endian and 0x6566696e big-endian, "
-                       "not 0x666d7431 in either byte order\nsource.src: this looks like a class definition source, not "
-                       "a CDB; qecfg compiles it into one\n"},
+        {"source.src",
+         "source.src: offset 8: the format word reads 0x6e696665 little-endian and 0x6566696e big-endian, "
+         "not 0x666d7431 in either byte order\nsource.src: this looks like a class definition source, not "
+         "a CDB; qecfg compiles it into one\n"},
     };
     for (const auto &[args, message] : cases) {
         std::string line = args.find('|') != std::string::npos ? args : dump + " " + args;

@@ -21,32 +21,40 @@ struct json_checker {
     const std::string &s;
     size_t i = 0;
     void ws() {
-        while (i < s.size() && std::isspace(static_cast<unsigned char>(s[i]))) i++;
+        while (i < s.size() && std::isspace(static_cast<unsigned char>(s[i])))
+            i++;
     }
     bool lit(const char *w) {
         size_t n = std::char_traits<char>::length(w);
-        if (s.compare(i, n, w) != 0) return false;
+        if (s.compare(i, n, w) != 0)
+            return false;
         i += n;
         return true;
     }
     // Raw bytes must be UTF-8 (checked by the standard library's strict
     // converter), escapes one of JSON's.
     bool string() {
-        if (s[i++] != '"') return false;
+        if (s[i++] != '"')
+            return false;
         size_t start = i;
         while (i < s.size() && s[i] != '"') {
-            if (static_cast<unsigned char>(s[i]) < 0x20) return false;
-            if (s[i] == '\\' && !escape()) return false;
+            if (static_cast<unsigned char>(s[i]) < 0x20)
+                return false;
+            if (s[i] == '\\' && !escape())
+                return false;
             i++;
         }
         return i < s.size() && utf8(s.substr(start, i - start)) && i++ < s.size();
     }
     bool escape() {
         i++;
-        if (i < s.size() && std::strchr("\"\\/bfnrt", s[i])) return true;
-        if (i >= s.size() || s[i] != 'u' || i + 4 >= s.size()) return false;
+        if (i < s.size() && std::strchr("\"\\/bfnrt", s[i]))
+            return true;
+        if (i >= s.size() || s[i] != 'u' || i + 4 >= s.size())
+            return false;
         for (int k = 1; k <= 4; k++)
-            if (!std::isxdigit(static_cast<unsigned char>(s[i + size_t(k)]))) return false;
+            if (!std::isxdigit(static_cast<unsigned char>(s[i + size_t(k)])))
+                return false;
         i += 4;
         return true;
     }
@@ -56,30 +64,36 @@ struct json_checker {
         while (p < end) {
             char32_t c;
             size_t n = std::mbrtoc32(&c, p, size_t(end - p), &state);
-            if (n == 0) n = 1;
-            if (n > size_t(end - p)) return false;
+            if (n == 0)
+                n = 1;
+            if (n > size_t(end - p))
+                return false;
             p += n;
         }
         return true;
     }
     bool number() {
         size_t start = i;
-        while (i < s.size() && std::strchr("+-0123456789.eE", s[i])) i++;
+        while (i < s.size() && std::strchr("+-0123456789.eE", s[i]))
+            i++;
         return i > start;
     }
     template <typename F> bool list(char close, F item) {
         ws();
-        if (i < s.size() && s[i] == close) return ++i, true;
+        if (i < s.size() && s[i] == close)
+            return ++i, true;
         do {
             ws();
-            if (!item()) return false;
+            if (!item())
+                return false;
             ws();
         } while (i < s.size() && s[i] == ',' && ++i);
         return i < s.size() && s[i++] == close;
     }
     bool value() {
         ws();
-        if (i >= s.size()) return false;
+        if (i >= s.size())
+            return false;
         switch (s[i]) {
         case '{': return ++i, list('}', [&] { return string() && (ws(), s[i++] == ':') && value(); });
         case '[': return ++i, list(']', [&] { return value(); });
@@ -175,10 +189,12 @@ TEST(Output, AnnotationLabelsEveryByteOnce) {
     size_t expect = 0;
     std::istringstream rows(text);
     for (std::string line; std::getline(rows, line);) {
-        if (line[0] == '#') continue;
+        if (line[0] == '#')
+            continue;
         EXPECT_EQ(std::stoul(line.substr(0, 8), nullptr, 16), expect) << line;
         std::istringstream bytes(line.substr(10, 47));
-        for (std::string byte; bytes >> byte;) expect++;
+        for (std::string byte; bytes >> byte;)
+            expect++;
     }
     EXPECT_EQ(expect, b.size());
 }

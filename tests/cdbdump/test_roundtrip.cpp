@@ -26,7 +26,8 @@ std::vector<fs::path> sources() {
     for (const char *dir : {"examples", "tests/e2e", "tests/cdbdump"})
         if (fs::exists(root / dir))
             for (const auto &e : fs::recursive_directory_iterator(root / dir))
-                if (e.path().extension() == ".src") found.push_back(e.path());
+                if (e.path().extension() == ".src")
+                    found.push_back(e.path());
     std::sort(found.begin(), found.end());
     return found;
 }
@@ -52,7 +53,8 @@ std::string content(const cdb_file &f, bool with_order) {
     node t = to_tree(f);
     t.erase("layout");
     t.find("header")->erase("timestamp");
-    if (!with_order) t.erase("byte_order");
+    if (!with_order)
+        t.erase("byte_order");
     return to_json(t);
 }
 
@@ -69,7 +71,8 @@ TEST(RoundTrip, SourceToCdbToSourceKeepsTheContent) {
         SCOPED_TRACE(src.string());
         work_dir w;
         fs::copy_file(src, w.path / "in.src");
-        if (!compile(w.path, "in.src out.cdef")) continue; // a source the compiler refuses
+        if (!compile(w.path, "in.src out.cdef"))
+            continue; // a source the compiler refuses
         compiled++;
         cdb_file original;
         ASSERT_NO_THROW(original = read(w.path / "out.cdef"));

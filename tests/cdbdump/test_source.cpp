@@ -59,12 +59,14 @@ TEST(SourceText, BinaryTextReadsBackToTheSameBytes) {
     EXPECT_EQ(binary_text({'a', 'b', 'A', '\\', 'c', 'd', 'e'}), "abA\\\\cde");
     EXPECT_EQ(binary_text({'0', 'a', 'b', 'c', 'd'}), "\\060abcd"); // a leading 0 would select the hex form
     std::vector<uint8_t> all;
-    for (int i = 0; i < 256; i++) all.push_back(uint8_t(i));
+    for (int i = 0; i < 256; i++)
+        all.push_back(uint8_t(i));
     for (const std::vector<uint8_t> &bytes : {all, std::vector<uint8_t>(all.begin() + 32, all.begin() + 127)}) {
         std::string t = binary_text(bytes);
         std::vector<uint8_t> back = t.rfind("0x", 0) == 0 ? std::vector<uint8_t>{} : read_escape_form(t);
         if (t.rfind("0x", 0) == 0)
-            for (size_t i = 2; i < t.size(); i += 2) back.push_back(uint8_t(std::stoi(t.substr(i, 2), nullptr, 16)));
+            for (size_t i = 2; i < t.size(); i += 2)
+                back.push_back(uint8_t(std::stoi(t.substr(i, 2), nullptr, 16)));
         EXPECT_EQ(back, bytes) << t;
         EXPECT_EQ(statement_value("\tDefaultValue=" + t), t.size() < 240 ? std::optional(t) : std::nullopt);
     }

@@ -11,8 +11,8 @@
 #include <sstream>
 
 #include "docgen.h"
-#include "qecfg/messages.h"
 #include "lang.h"
+#include "qecfg/messages.h"
 
 namespace fs = std::filesystem;
 

@@ -17,7 +17,8 @@ bool same(const node &a, const node &b) { return to_json_line(a) == to_json_line
 
 const node *member(const node &n, const std::string &key) {
     for (const auto &m : n.members())
-        if (m.first == key) return &m.second;
+        if (m.first == key)
+            return &m.second;
     return nullptr;
 }
 
@@ -61,15 +62,17 @@ std::vector<std::string> item_keys(const node &list, part_map &parts) {
 bool keyed(const node &list) {
     for (const node &i : list.items()) {
         const node *name = i.type() == node::kind::object ? member(i, "name") : nullptr;
-        if (!name || name->type() != node::kind::string) return false;
+        if (!name || name->type() != node::kind::string)
+            return false;
     }
     return true;
 }
 
 bool order_matters(const std::string &key) {
-    for (const char *sd : {"define_sd", "undefine_sd", "online_sd", "offline_sd", "reset_sd", "sd", "sd_input",
-                           "sd_response"})
-        if (key == sd) return true;
+    for (const char *sd :
+         {"define_sd", "undefine_sd", "online_sd", "offline_sd", "reset_sd", "sd", "sd_input", "sd_response"})
+        if (key == sd)
+            return true;
     return false;
 }
 
@@ -84,10 +87,12 @@ class differ {
     part_map parts;
 
     void compare(const node &a, const node &b, const path_t &path, const std::string &key) {
-        if (a.type() == node::kind::object && b.type() == node::kind::object) return objects(a, b, path);
+        if (a.type() == node::kind::object && b.type() == node::kind::object)
+            return objects(a, b, path);
         if (a.type() == node::kind::array && b.type() == node::kind::array && keyed(a) && keyed(b))
             return lists(a, b, path, order_matters(key));
-        if (!same(a, b)) changes.push_back(change{change::kind::changed, path, a, b, false, ""});
+        if (!same(a, b))
+            changes.push_back(change{change::kind::changed, path, a, b, false, ""});
     }
 
     void objects(const node &a, const node &b, const path_t &path) {
@@ -99,15 +104,18 @@ class differ {
                 changes.push_back(change{change::kind::removed, with(path, key), v, node::null(), false, ""});
         }
         for (const auto &[key, w] : b.members())
-            if (!member(a, key)) changes.push_back(change{change::kind::added, with(path, key), node::null(), w, false, ""});
+            if (!member(a, key))
+                changes.push_back(change{change::kind::added, with(path, key), node::null(), w, false, ""});
     }
 
     // Named items matched by name; path ends with the list's key.
     void lists(const node &a, const node &b, const path_t &path, bool ordered) {
         std::vector<std::string> keys_a = item_keys(a, parts), keys_b = item_keys(b, parts);
         std::map<std::string, size_t> in_a, in_b;
-        for (size_t i = 0; i < keys_a.size(); i++) in_a[keys_a[i]] = i;
-        for (size_t i = 0; i < keys_b.size(); i++) in_b[keys_b[i]] = i;
+        for (size_t i = 0; i < keys_a.size(); i++)
+            in_a[keys_a[i]] = i;
+        for (size_t i = 0; i < keys_b.size(); i++)
+            in_b[keys_b[i]] = i;
         node common_a = node::array(), common_b = node::array();
         for (size_t i = 0; i < keys_a.size(); i++) {
             const node &item = a.items()[i];
@@ -136,9 +144,11 @@ class differ {
 std::string dsect_key(const node &d, node &part) {
     std::string kind = member(d, "dsect")->text();
     const node *name = member(d, "name");
-    if (kind == "variable_class" && name->type() == node::kind::null) name = member(d, "alias");
+    if (kind == "variable_class" && name->type() == node::kind::null)
+        name = member(d, "alias");
     part = node::object().add("dsect", node::string(kind));
-    if (kind == "manager" || kind == "map" || !name) return kind;
+    if (kind == "manager" || kind == "map" || !name)
+        return kind;
     part.add("name", name->type() == node::kind::null ? node::null() : node::string(name->text()));
     return kind + " " + (name->type() == node::kind::null ? "(unnamed)" : c_quote(name->text()));
 }
@@ -153,8 +163,10 @@ struct keyed_dsects {
     keyed_dsects(const cdb_file &file, part_map &parts) : f(file) {
         std::vector<node> given;
         for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) {
-            node part = node::null(), key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
-            if (auto *c = std::get_if<class_dsect>(&f.dsects[i])) key.add("name", node::string(c->name));
+            node part = node::null(),
+                 key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
+            if (auto *c = std::get_if<class_dsect>(&f.dsects[i]))
+                key.add("name", node::string(c->name));
             if (auto *v = std::get_if<var_class_dsect>(&f.dsects[i]))
                 key.add("name", v->name ? node::string(*v->name) : node::null())
                     .add("alias", v->alias ? node::string(*v->alias) : node::null());
@@ -182,7 +194,8 @@ struct keyed_dsects {
 void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b) {
     d.compare(a.header(), b.header(), {"header"}, "header");
     std::map<std::string, size_t> in_b;
-    for (size_t i = 0; i < b.keys.size(); i++) in_b.emplace(b.keys[i], i);
+    for (size_t i = 0; i < b.keys.size(); i++)
+        in_b.emplace(b.keys[i], i);
     std::set<std::string> in_a(a.keys.begin(), a.keys.end());
     for (size_t i = 0; i < a.keys.size(); i++) {
         auto found = in_b.find(a.keys[i]);
@@ -214,8 +227,10 @@ namespace {
 enum class family { other, attribute, action, sd_element };
 
 family family_of(const std::string &list) {
-    if (list.find("_attributes") != std::string::npos) return family::attribute;
-    if (list.find("_actions") != std::string::npos) return family::action;
+    if (list.find("_attributes") != std::string::npos)
+        return family::attribute;
+    if (list.find("_actions") != std::string::npos)
+        return family::action;
     return order_matters(list) ? family::sd_element : family::other;
 }
 
@@ -233,8 +248,9 @@ void verdict(change &c, bool breaking, std::string reason) {
 
 void judge_removal(change &c) {
     const path_t &p = c.path;
-    if (p.size() == 1) return verdict(c, true, p[0].rfind("class ", 0) == 0 ? "a class was removed"
-                                                                           : "a dsect and what it held were removed");
+    if (p.size() == 1)
+        return verdict(c, true,
+                       p[0].rfind("class ", 0) == 0 ? "a class was removed" : "a dsect and what it held were removed");
     switch (owner(p, p.size() - 1)) {
     case family::attribute: return verdict(c, true, "an attribute was removed");
     case family::action: return verdict(c, true, "an action was removed");
@@ -245,11 +261,14 @@ void judge_removal(change &c) {
 
 // Every old ID keeps its place; new ones may follow.
 bool ids_kept(const node &before, const node &after) {
-    if (before.type() != node::kind::array || after.type() != node::kind::array) return false;
+    if (before.type() != node::kind::array || after.type() != node::kind::array)
+        return false;
     const auto &a = before.items(), &b = after.items();
-    if (b.size() < a.size()) return false;
+    if (b.size() < a.size())
+        return false;
     for (size_t i = 0; i < a.size(); i++)
-        if (!same(a[i], b[i])) return false;
+        if (!same(a[i], b[i]))
+            return false;
     return true;
 }
 
@@ -257,24 +276,32 @@ void judge_change(change &c) {
     // The member of the innermost named record (or of the dsect) that changed.
     size_t record = 0;
     for (size_t i = 1; i + 1 < c.path.size(); i++)
-        if (is_name(c.path[i])) record = i;
+        if (is_name(c.path[i]))
+            record = i;
     const std::string &field = c.path[std::min(record + 1, c.path.size() - 1)];
     family f = owner(c.path, record);
-    if (field == "class_id") return verdict(c, true, "the class id changed");
-    if (field == "id" && f == family::attribute) return verdict(c, true, "an attribute id changed");
-    if (field == "id" && f == family::action) return verdict(c, true, "an action id changed");
-    if (field == "data_type" && f == family::attribute) return verdict(c, true, "a data type changed");
+    if (field == "class_id")
+        return verdict(c, true, "the class id changed");
+    if (field == "id" && f == family::attribute)
+        return verdict(c, true, "an attribute id changed");
+    if (field == "id" && f == family::action)
+        return verdict(c, true, "an action id changed");
+    if (field == "data_type" && f == family::attribute)
+        return verdict(c, true, "a data type changed");
     if (field == "data_type" && f == family::sd_element)
         return verdict(c, true, "a structured-data element was retyped");
-    if (field == "variable_type") return verdict(c, true, "a variable type changed");
+    if (field == "variable_type")
+        return verdict(c, true, "a variable type changed");
     if (field == "variable_ids")
         return ids_kept(c.before, c.after) ? verdict(c, false, "variable IDs were added")
                                            : verdict(c, true, "a variable ID moved");
-    for (const char *text : {"description", "display_name", "group_name", "expression_description",
-                             "rearm_description", "range_description", "confirmation_message"})
-        if (field == text) return verdict(c, false, "a description or display name changed");
+    for (const char *text : {"description", "display_name", "group_name", "expression_description", "rearm_description",
+                             "range_description", "confirmation_message"})
+        if (field == text)
+            return verdict(c, false, "a description or display name changed");
     for (const char *value : {"default_value", "initial_value", "range", "valid_values"})
-        if (field == value) return verdict(c, false, "a default or range changed");
+        if (field == value)
+            return verdict(c, false, "a default or range changed");
     verdict(c, false, "nothing stored or called depends on it");
 }
 
@@ -282,7 +309,8 @@ void judge_change(change &c) {
 std::string move_reason(const std::string &from, const std::string &to) {
     bool persistence = (from.find("persistent") == 0) != (to.find("persistent") == 0);
     bool scope = (from.find("class_") != std::string::npos) != (to.find("class_") != std::string::npos);
-    if (persistence && scope) return "persistence and class/resource scope changed";
+    if (persistence && scope)
+        return "persistence and class/resource scope changed";
     return persistence ? "persistence changed" : "class/resource scope changed";
 }
 
@@ -291,9 +319,11 @@ std::string move_reason(const std::string &from, const std::string &to) {
 void pair_moves(std::vector<change> &changes) {
     std::vector<bool> merged(changes.size(), false);
     for (change &r : changes) {
-        if (r.what != change::kind::removed || r.path.size() != 3) continue;
+        if (r.what != change::kind::removed || r.path.size() != 3)
+            continue;
         family f = owner(r.path, 2);
-        if (f != family::attribute && f != family::action) continue;
+        if (f != family::attribute && f != family::action)
+            continue;
         for (size_t i = 0; i < changes.size(); i++) {
             const path_t &q = changes[i].path;
             if (merged[i] || changes[i].what != change::kind::added || q.size() != 3 || q[0] != r.path[0] ||
@@ -309,8 +339,10 @@ void pair_moves(std::vector<change> &changes) {
     }
     size_t kept = 0;
     for (size_t i = 0; i < changes.size(); i++) {
-        if (merged[i]) continue;
-        if (kept != i) changes[kept] = std::move(changes[i]);
+        if (merged[i])
+            continue;
+        if (kept != i)
+            changes[kept] = std::move(changes[i]);
         kept++;
     }
     changes.resize(kept);
@@ -328,7 +360,8 @@ const char *kind_name(change::kind k) {
 
 std::string path_text(const path_t &p) {
     std::string s;
-    for (const std::string &segment : p) s += (s.empty() ? "" : " / ") + segment;
+    for (const std::string &segment : p)
+        s += (s.empty() ? "" : " / ") + segment;
     return s;
 }
 
@@ -342,10 +375,12 @@ std::string change_line(const change &c, bool compat) {
 
 node change_node(const change &c, bool compat) {
     node path = node::array();
-    for (const node &part : c.parts) path.push(part);
+    for (const node &part : c.parts)
+        path.push(part);
     node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
     n.add("old", c.before).add("new", c.after);
-    if (compat) n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
+    if (compat)
+        n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
     return n;
 }
 } // namespace
@@ -365,12 +400,14 @@ void judge(std::vector<change> &changes) {
 
 void write_changes(text_sink &out, const std::vector<change> &changes, bool json, bool compat) {
     if (!json) {
-        for (const change &c : changes) out << change_line(c, compat);
+        for (const change &c : changes)
+            out << change_line(c, compat);
         return;
     }
     bool breaks = std::any_of(changes.begin(), changes.end(), [](const change &c) { return c.breaking; });
     node list = node::array();
-    for (const change &c : changes) list.push(change_node(c, compat));
+    for (const change &c : changes)
+        list.push(change_node(c, compat));
     node doc = node::object();
     if (compat)
         doc.add("compatible", node::real(breaks ? "false" : "true"));

@@ -22,7 +22,8 @@ bool length_field(const std::vector<uint8_t> &head, uint64_t &length) {
     for (bool big : {false, true}) {
         auto word = [&](size_t off) {
             uint32_t v = 0;
-            for (unsigned i = 0; i < 4; i++) v |= uint32_t(head[off + i]) << (big ? 8 * (3 - i) : 8 * i);
+            for (unsigned i = 0; i < 4; i++)
+                v |= uint32_t(head[off + i]) << (big ? 8 * (3 - i) : 8 * i);
             return v;
         };
         if (word(8) == CDB_FORMAT) {
@@ -42,8 +43,10 @@ bool read_more(int fd, std::vector<uint8_t> &bytes, size_t want, bool &at_end) {
         bytes.resize(start + piece);
         ssize_t n = ::read(fd, bytes.data() + start, piece);
         bytes.resize(start + size_t(std::max<ssize_t>(n, 0)));
-        if (n < 0 && errno == EINTR) continue;
-        if (n < 0) return false;
+        if (n < 0 && errno == EINTR)
+            continue;
+        if (n < 0)
+            return false;
         at_end = n == 0;
         want -= size_t(n);
     }
@@ -52,7 +55,8 @@ bool read_more(int fd, std::vector<uint8_t> &bytes, size_t want, bool &at_end) {
 } // namespace
 
 input_file::~input_file() {
-    if (mapped_) ::munmap(const_cast<uint8_t *>(mapped_), mapped_size_);
+    if (mapped_)
+        ::munmap(const_cast<uint8_t *>(mapped_), mapped_size_);
 }
 
 input_file::outcome input_file::fail(const char *step) {
@@ -67,9 +71,11 @@ input_file::outcome input_file::refuse(size_t at, std::string what) {
 }
 
 input_file::outcome input_file::load(const std::string &path) {
-    if (path == "-") return load_fd(STDIN_FILENO);
+    if (path == "-")
+        return load_fd(STDIN_FILENO);
     int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (fd < 0) return fail("cannot open");
+    if (fd < 0)
+        return fail("cannot open");
     outcome o = load_fd(fd);
     ::close(fd);
     return o;
@@ -77,19 +83,23 @@ input_file::outcome input_file::load(const std::string &path) {
 
 input_file::outcome input_file::load_fd(int fd) {
     struct stat st {};
-    if (::fstat(fd, &st) != 0) return fail("cannot read");
+    if (::fstat(fd, &st) != 0)
+        return fail("cannot read");
     if (S_ISDIR(st.st_mode)) {
         errno = EISDIR;
         return fail("cannot read");
     }
-    if (!S_ISREG(st.st_mode)) return read_stream(fd);
+    if (!S_ISREG(st.st_mode))
+        return read_stream(fd);
     uint64_t size = uint64_t(st.st_size);
     if (size > MAX_CDB_SIZE)
         return refuse(0, "the file has " + std::to_string(size) + " bytes, more than the " +
                              std::to_string(MAX_CDB_SIZE) + " that a 32-bit length field can describe");
-    if (size == 0) return outcome::loaded;
+    if (size == 0)
+        return outcome::loaded;
     void *p = ::mmap(nullptr, size_t(size), PROT_READ, MAP_PRIVATE, fd, 0);
-    if (p == MAP_FAILED) return fail("cannot read");
+    if (p == MAP_FAILED)
+        return fail("cannot read");
     mapped_ = static_cast<const uint8_t *>(p);
     mapped_size_ = size_t(size);
     return outcome::loaded;
@@ -101,15 +111,20 @@ input_file::outcome input_file::load_fd(int fd) {
 // to refuse the file.
 input_file::outcome input_file::read_stream(int fd) {
     bool at_end = false;
-    if (!read_more(fd, read_, CDB_HEADER_SIZE, at_end)) return fail("cannot read");
+    if (!read_more(fd, read_, CDB_HEADER_SIZE, at_end))
+        return fail("cannot read");
     uint64_t length = 0;
-    if (at_end || read_.size() < FORMAT_END || !length_field(read_, length)) return outcome::loaded;
+    if (at_end || read_.size() < FORMAT_END || !length_field(read_, length))
+        return outcome::loaded;
     uint64_t expected = length + 4;
     if (expected > read_.size() && !read_more(fd, read_, size_t(expected - read_.size()), at_end))
         return fail("cannot read");
-    if (at_end) return outcome::loaded;
-    if (!read_more(fd, read_, 1, at_end)) return fail("cannot read");
-    if (read_.size() <= expected) return outcome::loaded;
+    if (at_end)
+        return outcome::loaded;
+    if (!read_more(fd, read_, 1, at_end))
+        return fail("cannot read");
+    if (read_.size() <= expected)
+        return outcome::loaded;
     return refuse(0, "cdb_hdr_length is " + std::to_string(length) + ", but the file has more than " +
                          std::to_string(length) + " bytes after the length field");
 }

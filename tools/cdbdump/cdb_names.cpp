@@ -25,12 +25,14 @@ const prop_table perm_letters{perm_letter_list.data(), num_perm_list};
 std::vector<std::string> prop_names(const prop_table &t, uint32_t bits) {
     std::vector<std::string> names;
     for (int i = 0; i < t.count; i++)
-        if (bits & t.entries[i].p) names.emplace_back(t.entries[i].s);
+        if (bits & t.entries[i].p)
+            names.emplace_back(t.entries[i].s);
     return names;
 }
 
 uint32_t unnamed_bits(const prop_table &t, uint32_t bits) {
-    for (int i = 0; i < t.count; i++) bits &= ~t.entries[i].p;
+    for (int i = 0; i < t.count; i++)
+        bits &= ~t.entries[i].p;
     return bits;
 }
 

@@ -12,11 +12,14 @@ void text_sink::drain() {
 }
 
 bool text_sink::finish() {
-    if (!to_) return true;
+    if (!to_)
+        return true;
     drain();
     errno = 0;
-    if (!error_ && std::fflush(to_) != 0) error_ = errno ? errno : EIO;
-    if (!error_ && std::ferror(to_)) error_ = EIO;
+    if (!error_ && std::fflush(to_) != 0)
+        error_ = errno ? errno : EIO;
+    if (!error_ && std::ferror(to_))
+        error_ = EIO;
     return error_ == 0;
 }
 

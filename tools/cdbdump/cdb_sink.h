@@ -19,7 +19,8 @@ class text_sink {
 
     text_sink &operator<<(std::string_view s) {
         buf_ += s;
-        if (to_ && buf_.size() >= FLUSH_AT) drain();
+        if (to_ && buf_.size() >= FLUSH_AT)
+            drain();
         return *this;
     }
     text_sink &operator<<(char c) { return *this << std::string_view(&c, 1); }

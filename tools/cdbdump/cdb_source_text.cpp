@@ -27,7 +27,8 @@ std::optional<std::string> uncommented(const std::string &line) {
     for (size_t i = 0; i < line.size(); i++) {
         char c = line[i];
         bool inside = quotes % 2 == 1;
-        if (blank(c)) continue;
+        if (blank(c))
+            continue;
         if (c == '\n') {
             end = i;
             break;
@@ -39,9 +40,11 @@ std::optional<std::string> uncommented(const std::string &line) {
         bool comment_slash = c == '/' && i + 1 < line.size() && (line[i + 1] == '/' || line[i + 1] == '*');
         if (c == '#' || comment_slash) {
             // A '#' before any text makes a comment line even inside quotes; a slash pair does not.
-            if (non_blank == 0 && (c == '#' || !inside)) return std::nullopt;
+            if (non_blank == 0 && (c == '#' || !inside))
+                return std::nullopt;
             if (inside) {
-                if (c == '#') non_blank++;
+                if (c == '#')
+                    non_blank++;
                 continue;
             }
             end = i;
@@ -49,41 +52,54 @@ std::optional<std::string> uncommented(const std::string &line) {
         }
         non_blank++;
     }
-    if (non_blank == 0) return std::nullopt;
+    if (non_blank == 0)
+        return std::nullopt;
     std::string s = line.substr(0, end);
-    while (!s.empty() && (blank(s.back()) || s.back() == '#')) s.pop_back();
+    while (!s.empty() && (blank(s.back()) || s.back() == '#'))
+        s.pop_back();
     return s;
 }
 
 // The quote removal of a statement value; nothing for unmatched quotes.
 std::optional<std::string> unquoted(const std::string &v) {
     size_t q = v.find_first_not_of(" \t");
-    if (q == std::string::npos || v[q] != '"') return v;
-    if (v.back() != '"' || (v.size() >= 2 && v[v.size() - 2] == '\\')) return std::nullopt;
+    if (q == std::string::npos || v[q] != '"')
+        return v;
+    if (v.back() != '"' || (v.size() >= 2 && v[v.size() - 2] == '\\'))
+        return std::nullopt;
     size_t last = v.size() - 1;
     return last > q ? v.substr(q + 1, last - q - 1) : std::string();
 }
 
 bool printable_in_escape_form(uint8_t b, bool first, bool last) {
-    if (b < 0x20 || b > 0x7e) return false;
-    if (b == '"' || b == '#' || b == '/' || b == ',' || b == '\\') return false; // comment, quote, value separators
-    if (first && b == '0') return false; // a leading 0 selects the hexadecimal form
-    if (last && b == ' ') return false;  // trailing blanks are stripped from the line
+    if (b < 0x20 || b > 0x7e)
+        return false;
+    if (b == '"' || b == '#' || b == '/' || b == ',' || b == '\\')
+        return false; // comment, quote, value separators
+    if (first && b == '0')
+        return false; // a leading 0 selects the hexadecimal form
+    if (last && b == ' ')
+        return false; // trailing blanks are stripped from the line
     return true;
 }
 } // namespace
 
 std::optional<std::string> statement_value(const std::string &line) {
-    if (line.size() > MAX_LINE) return std::nullopt;
+    if (line.size() > MAX_LINE)
+        return std::nullopt;
     auto s = uncommented(line);
-    if (!s || s->empty() || !blank((*s)[0])) return std::nullopt;
+    if (!s || s->empty() || !blank((*s)[0]))
+        return std::nullopt;
     size_t name = s->find_first_not_of(" \t");
     size_t eq = name == std::string::npos ? std::string::npos : s->find('=', name);
-    if (eq == std::string::npos) return std::nullopt;
+    if (eq == std::string::npos)
+        return std::nullopt;
     std::string v = s->substr(eq + 1);
-    if (v == "\"\"") return std::nullopt; // the statement is ignored
+    if (v == "\"\"")
+        return std::nullopt; // the statement is ignored
     auto value = unquoted(v);
-    if (!value || value->empty() || value->size() > MAX_VALUE) return std::nullopt;
+    if (!value || value->empty() || value->size() > MAX_VALUE)
+        return std::nullopt;
     return value;
 }
 
@@ -91,14 +107,16 @@ std::optional<std::string> statement_line(const std::string &name, const std::st
     for (const std::string &form : {text, "\"" + text + "\""}) {
         std::string line = "\t" + name + "=" + form;
         auto back = statement_value(line);
-        if (back && *back == text) return line;
+        if (back && *back == text)
+            return line;
     }
     return std::nullopt;
 }
 
 std::string binary_text(const std::vector<uint8_t> &bytes) {
     std::string hexform = "0x" + hex_digits(bytes.data(), bytes.size());
-    if (bytes.empty()) return hexform;
+    if (bytes.empty())
+        return hexform;
     std::string esc;
     for (size_t i = 0; i < bytes.size(); i++) {
         uint8_t b = bytes[i];
@@ -128,10 +146,12 @@ template <typename F, typename B> bool reads_back(const std::string &text, B bit
     F v;
     if constexpr (sizeof(F) == 4) {
         v = std::strtof(text.c_str(), &end);
-        if (refused<float>(v, FLT_MAX, FLT_MIN)) return false;
+        if (refused<float>(v, FLT_MAX, FLT_MIN))
+            return false;
     } else {
         v = std::strtod(text.c_str(), &end);
-        if (refused<double>(v, DBL_MAX, DBL_MIN)) return false;
+        if (refused<double>(v, DBL_MAX, DBL_MIN))
+            return false;
     }
     B got;
     std::memcpy(&got, &v, sizeof got);
@@ -151,7 +171,8 @@ template <typename F, typename B> std::optional<std::string> nan_text(B bits) {
 }
 
 template <typename F, typename B> std::optional<std::string> float_source_text(const std::string &text, B bits) {
-    if (reads_back<F>(text, bits)) return text;
+    if (reads_back<F>(text, bits))
+        return text;
     F f;
     std::memcpy(&f, &bits, sizeof f);
     return std::isnan(f) ? nan_text<F>(bits) : std::nullopt;
@@ -160,8 +181,10 @@ template <typename F, typename B> std::optional<std::string> float_source_text(c
 
 std::optional<std::string> number_source_text(uint32_t type, uint64_t bits) {
     std::string text = number_text(type, bits);
-    if (type == 6) return float_source_text<float>(text, uint32_t(bits));
-    if (type == 7) return float_source_text<double>(text, bits);
+    if (type == 6)
+        return float_source_text<float>(text, uint32_t(bits));
+    if (type == 7)
+        return float_source_text<double>(text, bits);
     return text;
 }
 

@@ -31,9 +31,11 @@ namespace {
 size_t utf8_length(const unsigned char *p, size_t n) {
     unsigned char c = p[0];
     size_t len = c >= 0xf0 ? 4 : c >= 0xe0 ? 3 : 2;
-    if (c < 0xc2 || c > 0xf4 || len > n) return 0;
+    if (c < 0xc2 || c > 0xf4 || len > n)
+        return 0;
     for (size_t i = 1; i < len; i++)
-        if ((p[i] & 0xc0) != 0x80) return 0;
+        if ((p[i] & 0xc0) != 0x80)
+            return 0;
     unsigned char second = p[1];
     if ((c == 0xe0 && second < 0xa0) || (c == 0xed && second > 0x9f) || (c == 0xf0 && second < 0x90) ||
         (c == 0xf4 && second > 0x8f))
@@ -81,7 +83,8 @@ std::string json_quote(const std::string &s) { return quote_with(s, "\\u%04x", t
 
 namespace {
 template <typename F> std::string special_float(F f) {
-    if (std::isnan(f)) return std::signbit(f) ? "-nan" : "nan";
+    if (std::isnan(f))
+        return std::signbit(f) ? "-nan" : "nan";
     return std::signbit(f) ? "-inf" : "inf";
 }
 } // namespace
@@ -89,7 +92,8 @@ template <typename F> std::string special_float(F f) {
 std::string float32_text(uint32_t bits) {
     float f;
     std::memcpy(&f, &bits, sizeof f);
-    if (!std::isfinite(f)) return special_float(f);
+    if (!std::isfinite(f))
+        return special_float(f);
     char buf[48];
     std::snprintf(buf, sizeof buf, "%.9g", double(f));
     return buf;
@@ -98,7 +102,8 @@ std::string float32_text(uint32_t bits) {
 std::string float64_text(uint64_t bits) {
     double d;
     std::memcpy(&d, &bits, sizeof d);
-    if (!std::isfinite(d)) return special_float(d);
+    if (!std::isfinite(d))
+        return special_float(d);
     char buf[48];
     std::snprintf(buf, sizeof buf, "%.17g", d);
     return buf;

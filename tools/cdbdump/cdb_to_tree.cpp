@@ -13,7 +13,8 @@ node opt_string(const std::optional<std::string> &s) { return s ? node::string(*
 
 node names_node(const std::vector<std::string> &names) {
     node a = node::array();
-    for (const auto &n : names) a.push(node::token(n));
+    for (const auto &n : names)
+        a.push(node::token(n));
     return a;
 }
 
@@ -42,12 +43,14 @@ node bytes_node(const std::vector<uint8_t> &b) { return node::token("0x" + hex_d
 
 node varieties_node(const std::vector<variety> &vs) {
     node a = node::array();
-    for (const variety &v : vs) a.push(node::array().push(node::uinteger(v.low)).push(node::uinteger(v.high)));
+    for (const variety &v : vs)
+        a.push(node::array().push(node::uinteger(v.low)).push(node::uinteger(v.high)));
     return a;
 }
 
 node valid_values_node(const std::optional<valid_values> &vv) {
-    if (!vv) return node::null();
+    if (!vv)
+        return node::null();
     node a = node::array();
     for (const valid_value &v : *vv)
         a.push(node::object()
@@ -58,7 +61,8 @@ node valid_values_node(const std::optional<valid_values> &vv) {
 }
 
 node sd_node(const std::optional<sd_definition> &sd) {
-    if (!sd) return node::null();
+    if (!sd)
+        return node::null();
     node a = node::array();
     for (const sd_element &e : *sd)
         a.push(node::object()
@@ -131,7 +135,8 @@ node action_node(const action &x) {
 
 template <typename T, typename F> node list_node(const std::vector<T> &items, F f) {
     node a = node::array();
-    for (const T &i : items) a.push(f(i));
+    for (const T &i : items)
+        a.push(f(i));
     return a;
 }
 
@@ -196,7 +201,8 @@ node map_node(const map_dsect &m) {
 
 node var_class_node(const var_class_dsect &v) {
     node ids = node::array();
-    for (uint32_t id : v.var_ids) ids.push(node::uinteger(id));
+    for (uint32_t id : v.var_ids)
+        ids.push(node::uinteger(id));
     return node::object()
         .add("name", opt_string(v.name))
         .add("alias", opt_string(v.alias))
@@ -206,7 +212,9 @@ node var_class_node(const var_class_dsect &v) {
 }
 
 node dsect_head(const anchor &a) {
-    return node::object().add("dsect", node::token(dsect_kind_name(a.type))).add("revision", node::uinteger(a.revision));
+    return node::object()
+        .add("dsect", node::token(dsect_kind_name(a.type)))
+        .add("revision", node::uinteger(a.revision));
 }
 } // namespace
 
@@ -225,13 +233,15 @@ node dsect_node(const dsect &d, const anchor &a) {
                 return var_class_node(x);
         },
         d);
-    for (const auto &m : body.members()) head.add(m.first, m.second);
+    for (const auto &m : body.members())
+        head.add(m.first, m.second);
     return head;
 }
 
 namespace {
 void add_members(tree_writer &w, const node &object) {
-    for (const auto &m : object.members()) w.member(m.first, m.second);
+    for (const auto &m : object.members())
+        w.member(m.first, m.second);
 }
 
 const char *const record_size_names[NUM_RECORD_SIZES] = {
@@ -258,7 +268,8 @@ node value_node(const value &v) {
 
 node file_head(const cdb_file &f) {
     node sizes = node::object();
-    for (int i = 0; i < NUM_RECORD_SIZES; i++) sizes.add(record_size_names[i], node::uinteger(f.record_sizes[i]));
+    for (int i = 0; i < NUM_RECORD_SIZES; i++)
+        sizes.add(record_size_names[i], node::uinteger(f.record_sizes[i]));
     node header = node::object()
                       .add("seqno", node::uinteger(f.seqno))
                       .add("timestamp",
@@ -284,7 +295,8 @@ node file_head(const cdb_file &f) {
 
 node to_tree(const cdb_file &f) {
     node dsects = node::array();
-    for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) dsects.push(dsect_node(f.dsects[i], f.anchors[i]));
+    for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++)
+        dsects.push(dsect_node(f.dsects[i], f.anchors[i]));
     return file_head(f).add("dsects", dsects);
 }
 
@@ -307,7 +319,8 @@ void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
     add_members(w, class_fields(*c));
     class_lists(*c, [&](const char *key, const auto &items, auto render) {
         w.begin_array(key, items.size());
-        for (const auto &x : items) w.item(render(x));
+        for (const auto &x : items)
+            w.item(render(x));
         w.end();
     });
     w.end();

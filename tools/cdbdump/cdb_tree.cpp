@@ -12,7 +12,8 @@ node node::flags(uint64_t v) {
 
 node *node::find(const std::string &key) {
     for (auto &m : members_)
-        if (m.first == key) return &m.second;
+        if (m.first == key)
+            return &m.second;
     return nullptr;
 }
 
@@ -40,14 +41,17 @@ void json_into(const node &n, int indent, std::string &out) {
     case node::kind::token: out += json_quote(n.text()); return;
     case node::kind::array: {
         bool flat = true;
-        for (const node &i : n.items()) flat = flat && is_scalar(i);
+        for (const node &i : n.items())
+            flat = flat && is_scalar(i);
         out += "[";
         for (size_t i = 0; i < n.items().size(); i++) {
-            if (i) out += ",";
+            if (i)
+                out += ",";
             out += flat ? (i ? " " : "") : "\n" + pad;
             json_into(n.items()[i], indent + 2, out);
         }
-        if (!flat && !n.items().empty()) out.append("\n").append(size_t(indent), ' ');
+        if (!flat && !n.items().empty())
+            out.append("\n").append(size_t(indent), ' ');
         out += "]";
         return;
     }
@@ -58,7 +62,8 @@ void json_into(const node &n, int indent, std::string &out) {
             out += pad + json_quote(n.members()[i].first) + ": ";
             json_into(n.members()[i].second, indent + 2, out);
         }
-        if (!n.members().empty()) out.append("\n").append(size_t(indent), ' ');
+        if (!n.members().empty())
+            out.append("\n").append(size_t(indent), ' ');
         out += "}";
         return;
     }
@@ -82,16 +87,21 @@ constexpr size_t INLINE_MEMBERS = 3; // larger records always get a block of the
 
 // The one-line form of a node, or "" when it does not fit in the width left.
 std::string inline_text(const node &n, size_t room) {
-    if (is_scalar(n)) return scalar_text(n);
+    if (is_scalar(n))
+        return scalar_text(n);
     bool arr = n.type() == node::kind::array;
-    if (!arr && n.members().size() > INLINE_MEMBERS) return "";
+    if (!arr && n.members().size() > INLINE_MEMBERS)
+        return "";
     std::string s = arr ? "[" : "{";
     size_t count = arr ? n.items().size() : n.members().size();
     for (size_t i = 0; i < count; i++) {
-        if (i) s += ", ";
-        if (!arr) s += n.members()[i].first + ": ";
+        if (i)
+            s += ", ";
+        if (!arr)
+            s += n.members()[i].first + ": ";
         std::string part = inline_text(arr ? n.items()[i] : n.members()[i].second, room);
-        if (part.empty() || s.size() + part.size() > room) return "";
+        if (part.empty() || s.size() + part.size() > room)
+            return "";
         s += part;
     }
     return s + (arr ? "]" : "}");
@@ -126,10 +136,12 @@ void text_item(const node &item, size_t indent, std::string &out) {
 
 void text_into(const node &n, size_t indent, std::string &out) {
     if (n.type() == node::kind::object) {
-        for (const auto &m : n.members()) text_member(m.first, m.second, indent, out);
+        for (const auto &m : n.members())
+            text_member(m.first, m.second, indent, out);
         return;
     }
-    for (const node &item : n.items()) text_item(item, indent, out);
+    for (const node &item : n.items())
+        text_item(item, indent, out);
 }
 } // namespace
 
@@ -149,7 +161,8 @@ std::string to_json_line(const node &n) {
     case node::kind::array: {
         std::string s = "[";
         for (const node &i : n.items()) {
-            if (s.size() > 1) s += ',';
+            if (s.size() > 1)
+                s += ',';
             s += to_json_line(i);
         }
         return s + "]";
@@ -157,7 +170,8 @@ std::string to_json_line(const node &n) {
     default: {
         std::string s = "{";
         for (const auto &[key, v] : n.members()) {
-            if (s.size() > 1) s += ',';
+            if (s.size() > 1)
+                s += ',';
             s += json_quote(key);
             s += ':';
             s += to_json_line(v);
@@ -169,11 +183,11 @@ std::string to_json_line(const node &n) {
 
 std::string to_text(const node &n) {
     std::string out;
-    if (is_scalar(n)) return scalar_text(n) + "\n";
+    if (is_scalar(n))
+        return scalar_text(n) + "\n";
     text_into(n, 0, out);
     return out;
 }
-
 
 // The indent of a frame is the one json_into or text_into would be given for
 // the node it stands for.
@@ -182,17 +196,20 @@ void tree_writer::begin_object() {
         open_.push_back({false, 0, 0});
     } else {
         frame &a = open_.back();
-        if (style_ == style::json) out_ << (a.done ? ",\n" : "\n") << std::string(a.indent + 2, ' ');
+        if (style_ == style::json)
+            out_ << (a.done ? ",\n" : "\n") << std::string(a.indent + 2, ' ');
         a.done++;
         open_.push_back({false, a.indent + 2, 0});
         item_opening_ = style_ == style::text;
     }
-    if (style_ == style::json) out_ << "{";
+    if (style_ == style::json)
+        out_ << "{";
 }
 
 void tree_writer::next_member(const std::string &key) {
     frame &o = open_.back();
-    if (style_ == style::json) out_ << (o.done ? ",\n" : "\n") << std::string(o.indent + 2, ' ') << json_quote(key) << ": ";
+    if (style_ == style::json)
+        out_ << (o.done ? ",\n" : "\n") << std::string(o.indent + 2, ' ') << json_quote(key) << ": ";
     o.done++;
 }
 
@@ -204,7 +221,8 @@ void tree_writer::member(const std::string &key, const node &value) {
         json_into(value, int(indent + 2), s);
     } else {
         text_member(key, value, indent, s);
-        if (item_opening_) s.replace(indent - 2, 2, "- ");
+        if (item_opening_)
+            s.replace(indent - 2, 2, "- ");
         item_opening_ = false;
     }
     out_ << s;
@@ -217,7 +235,8 @@ void tree_writer::begin_array(const std::string &key, size_t count) {
         out_ << "[";
     } else {
         std::string s = std::string(indent, ' ') + key + (count ? ":\n" : ": []\n");
-        if (item_opening_) s.replace(indent - 2, 2, "- ");
+        if (item_opening_)
+            s.replace(indent - 2, 2, "- ");
         item_opening_ = false;
         out_ << s;
     }
@@ -240,10 +259,13 @@ void tree_writer::item(const node &n) {
 void tree_writer::end() {
     frame f = open_.back();
     open_.pop_back();
-    if (style_ == style::text) return;
-    if (f.done) out_ << '\n' << std::string(f.indent, ' ');
+    if (style_ == style::text)
+        return;
+    if (f.done)
+        out_ << '\n' << std::string(f.indent, ' ');
     out_ << (f.array ? "]" : "}");
-    if (open_.empty()) out_ << '\n';
+    if (open_.empty())
+        out_ << '\n';
 }
 
 } // namespace cdbdump

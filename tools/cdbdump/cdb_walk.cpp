@@ -19,7 +19,6 @@ struct read_past_end {
     size_t off;
 };
 
-
 const char *const size_fields[NUM_RECORD_SIZES] = {
     "cdb_hdr_rsrc_class_size",          "cdb_hdr_rsrc_cmmap_size", "cdb_hdr_rsrc_mgr_size",
     "cdb_hdr_rsrc_variable_class_size", "cdb_hdr_rsrc_pattr_size", "cdb_hdr_rsrc_dattr_size",
@@ -40,7 +39,8 @@ int dsect_rank(uint32_t type) {
 
 std::string id_text(uint32_t id) {
     std::string s = hex(id);
-    if ((id >> 8) == 0x434442) s += std::string(" (\"CDB") + char(id & 0xff) + "\")";
+    if ((id >> 8) == 0x434442)
+        s += std::string(" (\"CDB") + char(id & 0xff) + "\")";
     return s;
 }
 } // namespace
@@ -55,27 +55,34 @@ const uint16_t record_sizes[NUM_RECORD_SIZES] = {
 // Basics
 
 uint64_t walker::get(size_t off, unsigned width) const {
-    if (!(off <= n_ && width <= n_ - off)) throw read_past_end{off};
+    if (!(off <= n_ && width <= n_ - off))
+        throw read_past_end{off};
     uint64_t v = 0;
-    for (unsigned i = 0; i < width; i++) v |= uint64_t(d_[off + i]) << (big_ ? 8 * (width - 1 - i) : 8 * i);
+    for (unsigned i = 0; i < width; i++)
+        v |= uint64_t(d_[off + i]) << (big_ ? 8 * (width - 1 - i) : 8 * i);
     return v;
 }
 
 bool walker::check(bool ok, size_t off, const std::string &what) {
-    if (ok) return true;
-    if (!annotating_) throw cdb_invalid(off, what);
+    if (ok)
+        return true;
+    if (!annotating_)
+        throw cdb_invalid(off, what);
     violations_++;
-    if (in_window(off)) spans_.push_back(span{off, 0, "", what, true});
+    if (in_window(off))
+        spans_.push_back(span{off, 0, "", what, true});
     return false;
 }
 
 void walker::emit(size_t off, size_t len, std::string field, std::string value) {
-    if (annotating_ && in_window(off)) spans_.push_back(span{off, len, std::move(field), std::move(value), false});
+    if (annotating_ && in_window(off))
+        spans_.push_back(span{off, len, std::move(field), std::move(value), false});
 }
 
 uint64_t walker::num(size_t off, unsigned width, const std::string &field) {
     uint64_t v = get(off, width);
-    if (annotating_) emit(off, width, field, hexdec(v));
+    if (annotating_)
+        emit(off, width, field, hexdec(v));
     return v;
 }
 
@@ -93,7 +100,8 @@ uint32_t walker::ref(size_t off, const std::string &field) {
 
 bool walker::claimed(size_t off, size_t len) const {
     auto it = claims_.lower_bound(off + len);
-    if (it == claims_.begin()) return false;
+    if (it == claims_.begin())
+        return false;
     --it; // the last claim that starts before the end; claims never overlap each other
     return it->second > off;
 }
@@ -112,7 +120,8 @@ std::optional<std::string> walker::string_at(const region &r, uint32_t off, size
         return std::nullopt;
     size_t start = r.base + off;
     auto known = string_lengths_.find(start);
-    if (known != string_lengths_.end()) return std::string(reinterpret_cast<const char *>(d_ + start), known->second);
+    if (known != string_lengths_.end())
+        return std::string(reinterpret_cast<const char *>(d_ + start), known->second);
     const void *nul = std::memchr(d_ + start, 0, r.len - off);
     if (!check(nul != nullptr, at,
                field + ": the string at " + r.name + "+" + hex(off) + " is not terminated inside the table"))
@@ -235,7 +244,8 @@ std::vector<bool> walker::walk_anchors(cdb_file &f) {
         bool inside = check(a.length <= n_ && a.offset <= n_ - a.length, at + 8,
                             path + ": the dsect at " + std::to_string(a.offset) + " of " + std::to_string(a.length) +
                                 " bytes runs past the end of the file (" + std::to_string(n_) + " bytes)");
-        if (inside) prev_end = std::max<size_t>(prev_end, size_t(a.offset) + a.length);
+        if (inside)
+            prev_end = std::max<size_t>(prev_end, size_t(a.offset) + a.length);
         walkable[i] = known && after && inside;
     }
     check(per_rank[0] >= 1 && per_rank[1] == 1 && per_rank[2] == 1, 24,
@@ -247,7 +257,8 @@ std::vector<bool> walker::walk_anchors(cdb_file &f) {
 void walker::walk_dsects(cdb_file &f, const std::vector<bool> &walkable) {
     for (size_t i = 0; i < walkable.size(); i++) {
         const anchor &a = f.anchors[i];
-        if (!walkable[i] || a.offset >= window_end_ || size_t(a.offset) + a.length < window_start_) continue;
+        if (!walkable[i] || a.offset >= window_end_ || size_t(a.offset) + a.length < window_start_)
+            continue;
         pass_spans(a.offset);
         // A dsect's lists, bodies and strings lie inside it, and dsects do not overlap.
         claims_.clear();
@@ -267,8 +278,10 @@ void walker::walk_dsects(cdb_file &f, const std::vector<bool> &walkable) {
 }
 
 void walker::keep(cdb_file &f, dsect d) {
-    if (auto *m = std::get_if<mgr_dsect>(&d)) maxima_.rm_id = std::max(maxima_.rm_id, m->id);
-    if (auto *c = std::get_if<class_dsect>(&d)) maxima_.class_id = std::max(maxima_.class_id, c->class_id);
+    if (auto *m = std::get_if<mgr_dsect>(&d))
+        maxima_.rm_id = std::max(maxima_.rm_id, m->id);
+    if (auto *c = std::get_if<class_dsect>(&d))
+        maxima_.class_id = std::max(maxima_.class_id, c->class_id);
     if (each_)
         each_(maxima_.walked, std::move(d));
     else
@@ -277,11 +290,13 @@ void walker::keep(cdb_file &f, dsect d) {
 }
 
 void walker::pass_spans(size_t below) {
-    if (each_spans_) each_spans_(std::exchange(spans_, {}), below);
+    if (each_spans_)
+        each_spans_(std::exchange(spans_, {}), below);
 }
 
 void walker::check_maxima(const cdb_file &f, const dsect_maxima &m) {
-    if (m.walked != f.anchors.size()) return;
+    if (m.walked != f.anchors.size())
+        return;
     check(f.max_rm_id == m.rm_id, 28,
           "cdb_hdr_max_rm_id is " + std::to_string(f.max_rm_id) + ", but the largest manager id is " +
               std::to_string(m.rm_id));
@@ -303,9 +318,11 @@ cdb_file walker::run() {
         detect_order();
         walk_header(f);
         std::vector<bool> walkable = walk_anchors(f);
-        if (known_maxima_) check_maxima(f, *known_maxima_);
+        if (known_maxima_)
+            check_maxima(f, *known_maxima_);
         walk_dsects(f, walkable);
-        if (!known_maxima_) check_maxima(f, maxima_);
+        if (!known_maxima_)
+            check_maxima(f, maxima_);
     } catch (const read_past_end &e) {
         check(false, e.off, "a read past the end of the file");
     }
@@ -432,9 +449,11 @@ cdb_file verify(const uint8_t *data, size_t size) { return verify_each(data, siz
 
 cdb_file verify_each(const uint8_t *data, size_t size, const dsect_consumer &each) {
     cdb_file f;
-    if (read_checked(data, size, f, each)) return f;
+    if (read_checked(data, size, f, each))
+        return f;
     walker w(data, size, false);
-    if (each) w.hand_dsects_to(each);
+    if (each)
+        w.hand_dsects_to(each);
     return w.run();
 }
 
@@ -463,7 +482,8 @@ size_t annotate_each(const uint8_t *data, size_t size, bool &big_endian, const s
         w.hand_dsects_to([](size_t, dsect &&) {});
         w.hand_spans_to(each);
         w.run();
-        if (last) break;
+        if (last)
+            break;
     }
     return violations;
 }

@@ -151,7 +151,8 @@ class_dsect walker::walk_class(const anchor &a, const std::string &path) {
     class_tables t;
     region tables[NUM_TABLES];
     walk_empty_tables(b, path);
-    if (!walk_class_layout(a, path, t, tables)) return c;
+    if (!walk_class_layout(a, path, t, tables))
+        return c;
     walk_class_fields(b, path, t, c);
 
     // Walks the records of one table into out, through walk(record, path, item).
@@ -177,7 +178,8 @@ class_dsect walker::walk_class(const anchor &a, const std::string &path) {
     each(T_ACTIONS_C, sizeof(rsrc_action_t), "actionsC", c.actions_class, actions(RSRC_ACTION_CLASS_ID));
     each(T_ACTIONS, sizeof(rsrc_action_t), "actions", c.actions, actions(RSRC_ACTION_RSRC_ID));
     // Last, so that the bodies every other value designates are known.
-    for (const pending_range &p : pending) decide_range(p, t);
+    for (const pending_range &p : pending)
+        decide_range(p, t);
     return c;
 }
 
@@ -267,9 +269,11 @@ void walker::walk_dattr(size_t rec, const std::string &path, const class_tables 
 bool walker::is_default_range_array(size_t at, uint32_t elem_type, uint64_t expected, const class_tables &t) const {
     uint32_t off = uint32_t(get(at, 4));
     const size_t body_size = ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE;
-    if (off == CDB_NONE || !fits(t.strings, off, body_size)) return false;
+    if (off == CDB_NONE || !fits(t.strings, off, body_size))
+        return false;
     size_t body = t.strings.base + off;
-    if (get(body, 4) != 1 || claimed(body, body_size)) return false;
+    if (get(body, 4) != 1 || claimed(body, body_size))
+        return false;
     return get(body + ZU_ARRAY_HEADER_SIZE, is_wide_type(elem_type) ? 8 : 4) == expected;
 }
 

@@ -29,15 +29,18 @@ std::optional<size_t> walker::list_at(size_t at, const region &r, size_t entry, 
         return std::nullopt;
     size_t list = r.base + off;
     std::string head = field + "->" + prefix;
-    if (!expect_id(list, id, head + "_cb_ID")) return std::nullopt;
+    if (!expect_id(list, id, head + "_cb_ID"))
+        return std::nullopt;
     count = uint32_t(num(list + 4, 4, head + "_count"));
     size_t room = (r.len - off - 8) / entry;
     if (!check(count <= room, list + 4,
                head + "_count is " + std::to_string(count) + ", but only " + std::to_string(room) + " entries fit in " +
                    r.name))
         return std::nullopt;
-    if (!claim(list, 8 + entry * std::max<size_t>(count, 1), at, field + ": the list")) return std::nullopt;
-    if (count == 0) emit(list + 8, entry, head + " (room for the first entry)", "unused");
+    if (!claim(list, 8 + entry * std::max<size_t>(count, 1), at, field + ": the list"))
+        return std::nullopt;
+    if (count == 0)
+        emit(list + 8, entry, head + " (room for the first entry)", "unused");
     return list;
 }
 
@@ -45,7 +48,8 @@ std::vector<variety> walker::walk_varieties(size_t at, const class_tables &t, co
     std::vector<variety> out;
     uint32_t count;
     auto list = list_at(at, t.varieties, sizeof(vl_entry), VARIETY_LIST_ID, field, false, "vl", count);
-    if (!list) return out;
+    if (!list)
+        return out;
     for (uint32_t i = 0; i < count; i++) {
         size_t e = *list + offsetof(variety_list_t, vl_values) + i * sizeof(vl_entry);
         std::string name = item(field + "->vl_values", i);
@@ -61,7 +65,8 @@ std::optional<valid_values> walker::walk_valid_values(size_t at, uint32_t type, 
                                                       const std::string &field) {
     uint32_t count;
     auto list = list_at(at, t.valid_values, sizeof(vv_entry), VALID_VALUES_ID, field, true, "vv", count);
-    if (!list) return std::nullopt;
+    if (!list)
+        return std::nullopt;
     valid_values out;
     for (uint32_t i = 0; i < count; i++) {
         size_t e = *list + offsetof(valid_values_t, vv_values) + i * sizeof(vv_entry);
@@ -79,7 +84,8 @@ std::optional<valid_values> walker::walk_valid_values(size_t at, uint32_t type, 
 std::optional<sd_definition> walker::walk_sd_def(size_t at, const class_tables &t, const std::string &field) {
     uint32_t count;
     auto list = list_at(at, t.sd_defs, sizeof(sd_field), SD_DEF_ID, field, true, "sd", count);
-    if (!list) return std::nullopt;
+    if (!list)
+        return std::nullopt;
     sd_definition out;
     for (uint32_t i = 0; i < count; i++) {
         size_t e = *list + offsetof(sd_def_t, sd_fields) + i * sizeof(sd_field);
@@ -129,7 +135,8 @@ value walker::typed_value(size_t at, uint32_t type, const class_tables &t, const
     if (type == ZU_UNKNOWN || type == ZU_NONE || type == ZU_SBS_PTR) {
         // Nothing is placed for these types, and the byte-order reversal leaves them as they are.
         v.kind = value_kind::raw;
-        for (size_t i = 0; i < 8; i++) v.bytes.push_back(uint8_t(get(at + i, 1)));
+        for (size_t i = 0; i < 8; i++)
+            v.bytes.push_back(uint8_t(get(at + i, 1)));
         emit(at, 8, field, data_type_name(type) + " (raw)");
         return v;
     }
@@ -156,7 +163,8 @@ value walker::typed_value(size_t at, uint32_t type, const class_tables &t, const
 
 void walker::string_body(uint32_t off, size_t at, const class_tables &t, const std::string &field, value &v) {
     auto s = string_at(t.strings, off, at, field);
-    if (!s) return;
+    if (!s)
+        return;
     v.kind = value_kind::string;
     v.text = *s;
 }
@@ -170,17 +178,21 @@ void walker::binary_body(size_t body, size_t room, size_t at, const std::string 
     if (!check(len <= room - ZU_BINARY_DATA_OFFSET, body,
                field + ": a binary of " + std::to_string(len) + " bytes runs past the end of ClassStrings"))
         return;
-    if (!claim(body, ZU_BINARY_DATA_OFFSET + len, at, field + ": the binary body")) return;
+    if (!claim(body, ZU_BINARY_DATA_OFFSET + len, at, field + ": the binary body"))
+        return;
     emit(body + 4, 4, field + "->pad", "");
     v.kind = value_kind::binary;
     v.bytes.assign(d_ + body + ZU_BINARY_DATA_OFFSET, d_ + body + ZU_BINARY_DATA_OFFSET + len);
-    if (len) emit(body + ZU_BINARY_DATA_OFFSET, len, field + "->data", std::to_string(len) + " bytes");
+    if (len)
+        emit(body + ZU_BINARY_DATA_OFFSET, len, field + "->data", std::to_string(len) + " bytes");
 }
 
 void walker::handle_body(size_t body, size_t room, size_t at, const std::string &field, value &v) {
     const size_t size = sizeof(zu_resource_handle_t);
-    if (!check(room >= size, at, field + ": a resource handle runs past the end of ClassStrings")) return;
-    if (!claim(body, size, at, field + ": the resource handle")) return;
+    if (!check(room >= size, at, field + ": a resource handle runs past the end of ClassStrings"))
+        return;
+    if (!claim(body, size, at, field + ": the resource handle"))
+        return;
     v.kind = value_kind::handle;
     v.bytes.assign(d_ + body, d_ + body + size);
     emit(body, size, field + "->handle", "");
@@ -188,7 +200,8 @@ void walker::handle_body(size_t body, size_t room, size_t at, const std::string 
 
 void walker::array_body(size_t body, size_t room, size_t at, const class_tables &t, const std::string &field,
                         value &v) {
-    if (!check(room >= ZU_ARRAY_HEADER_SIZE, at, field + ": an array header runs past the end of ClassStrings")) return;
+    if (!check(room >= ZU_ARRAY_HEADER_SIZE, at, field + ": an array header runs past the end of ClassStrings"))
+        return;
     uint32_t count = uint32_t(num(body, 4, field + "->element_count"));
     emit(body + 4, 4, field + "->pad", "");
     if (!check(count <= (room - ZU_ARRAY_HEADER_SIZE) / ZU_ARRAY_ELEMENT_SIZE, body,
@@ -198,12 +211,13 @@ void walker::array_body(size_t body, size_t room, size_t at, const class_tables 
         return;
     v.kind = value_kind::array;
     for (uint32_t i = 0; i < count; i++)
-        v.elements.push_back(typed_value(body + ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * i, zu_element_type(v.type),
-                                         t, item(field, i)));
+        v.elements.push_back(typed_value(body + ZU_ARRAY_HEADER_SIZE + ZU_ARRAY_ELEMENT_SIZE * i,
+                                         zu_element_type(v.type), t, item(field, i)));
 }
 
 void walker::sd_body(size_t body, size_t room, size_t at, const class_tables &t, const std::string &field, value &v) {
-    if (!check(room >= ZU_SD_HEADER_SIZE, at, field + ": a structured value runs past the end of ClassStrings")) return;
+    if (!check(room >= ZU_SD_HEADER_SIZE, at, field + ": a structured value runs past the end of ClassStrings"))
+        return;
     uint32_t count = uint32_t(num(body, 4, field + "->element_count"));
     emit(body + 4, 4, field + "->pad", "");
     // A structured value without elements still has room for one.
@@ -212,9 +226,11 @@ void walker::sd_body(size_t body, size_t room, size_t at, const class_tables &t,
                field + ": a structured value of " + std::to_string(count) +
                    " elements runs past the end of ClassStrings"))
         return;
-    if (!claim(body, ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * slots, at, field + ": the structured value")) return;
+    if (!claim(body, ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * slots, at, field + ": the structured value"))
+        return;
     v.kind = value_kind::sd;
-    if (count == 0) emit(body + ZU_SD_HEADER_SIZE, ZU_SD_ELEMENT_SIZE, field + " (room for one element)", "unused");
+    if (count == 0)
+        emit(body + ZU_SD_HEADER_SIZE, ZU_SD_ELEMENT_SIZE, field + " (room for one element)", "unused");
     for (uint32_t i = 0; i < count; i++) {
         size_t e = body + ZU_SD_HEADER_SIZE + ZU_SD_ELEMENT_SIZE * i;
         uint32_t dt = uint32_t(get(e, 4));

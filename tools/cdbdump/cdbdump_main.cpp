@@ -13,18 +13,19 @@
 #include "cdb_diff.h"
 #include "cdb_header.h"
 #include "cdb_input.h"
+#include "cdb_read.h"
 #include "cdb_sink.h"
 #include "cdb_source.h"
 #include "cdb_to_tree.h"
-#include "cdb_read.h"
 #include "cdb_walk.h"
 #include "cdbdump_usage.h"
 
 using namespace cdbdump;
 
 namespace {
-const char usage_line[] = "usage: cdbdump [--check | --json | --annotate | --source | --header] [-h|--help] [--version] FILE\n"
-                          "       cdbdump --diff | --compat [--json] OLD NEW\n";
+const char usage_line[] =
+    "usage: cdbdump [--check | --json | --annotate | --source | --header] [-h|--help] [--version] FILE\n"
+    "       cdbdump --diff | --compat [--json] OLD NEW\n";
 
 enum class mode { text, check, json, annotate, source, header, diff, compat };
 
@@ -73,24 +74,29 @@ std::optional<int> load(input_file &in, const std::string &path, FILE *err) {
 
 int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
     input_file in;
-    if (auto status = load(in, path, err)) return *status;
-    if (m == mode::annotate) return write_annotation(in.data(), in.size(), out) ? 1 : 0;
+    if (auto status = load(in, path, err))
+        return *status;
+    if (m == mode::annotate)
+        return write_annotation(in.data(), in.size(), out) ? 1 : 0;
     std::string name = display_name(path);
     try {
         if (m == mode::source) {
             decompiled d = decompile(verify(in.data(), in.size()));
             out << d.text;
-            for (const std::string &w : d.warnings) std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
+            for (const std::string &w : d.warnings)
+                std::fprintf(err, "%s: warning: %s\n", name.c_str(), w.c_str());
             return 0;
         }
-        if (m == mode::check && library_accepts(in.data(), in.size())) return 0;
+        if (m == mode::check && library_accepts(in.data(), in.size()))
+            return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
         if (m == mode::header) {
             write_c_header(in.data(), in.size(), name, out);
             return 0;
         }
         if (m != mode::check)
-            write_file(in.data(), in.size(), head, m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
+            write_file(in.data(), in.size(), head,
+                       m == mode::json ? tree_writer::style::json : tree_writer::style::text, out);
     } catch (const cdb_invalid &e) {
         return report_invalid(err, name, e.offset, e.message, in);
     }
@@ -102,7 +108,8 @@ int compare(const command &c, text_sink &out, FILE *err) {
     cdb_file files[2];
     for (int i = 0; i < 2; i++) {
         input_file in;
-        if (auto status = load(in, c.operands[size_t(i)], err)) return *status;
+        if (auto status = load(in, c.operands[size_t(i)], err))
+            return *status;
         try {
             files[i] = verify(in.data(), in.size());
         } catch (const cdb_invalid &e) {
@@ -112,18 +119,19 @@ int compare(const command &c, text_sink &out, FILE *err) {
     }
     std::vector<change> changes = diff(files[0], files[1]);
     bool compat = c.m == mode::compat;
-    if (compat) judge(changes);
+    if (compat)
+        judge(changes);
     write_changes(out, changes, c.json, compat);
-    if (!compat) return changes.empty() ? 0 : 1;
+    if (!compat)
+        return changes.empty() ? 0 : 1;
     return std::any_of(changes.begin(), changes.end(), [](const change &x) { return x.breaking; }) ? 1 : 0;
 }
 
 // Parses the options; a status when the command ends here (help, version, usage error).
 std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE *err) {
-    const std::pair<const char *, mode> modes[] = {{"--check", mode::check},   {"--json", mode::json},
-                                                   {"--annotate", mode::annotate}, {"--source", mode::source},
-                                                   {"--header", mode::header},
-                                                   {"--diff", mode::diff},     {"--compat", mode::compat}};
+    const std::pair<const char *, mode> modes[] = {
+        {"--check", mode::check},   {"--json", mode::json}, {"--annotate", mode::annotate}, {"--source", mode::source},
+        {"--header", mode::header}, {"--diff", mode::diff}, {"--compat", mode::compat}};
     bool mode_given = false, options_done = false;
     for (int i = 1; i < argc; i++) {
         std::string a = argv[i];
@@ -143,13 +151,16 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
             out << "cdbdump " QECFG_VERSION "\n";
             return 0;
         }
-        const auto *known = std::find_if(std::begin(modes), std::end(modes), [&](const auto &x) { return a == x.first; });
-        if (known == std::end(modes)) return usage_error(err, "unknown option " + a);
+        const auto *known =
+            std::find_if(std::begin(modes), std::end(modes), [&](const auto &x) { return a == x.first; });
+        if (known == std::end(modes))
+            return usage_error(err, "unknown option " + a);
         mode mm = known->second;
         bool comparing = c.m == mode::diff || c.m == mode::compat || mm == mode::diff || mm == mode::compat;
         if (mode_given && comparing && (mm == mode::json || c.m == mode::json) && !c.json) {
             c.json = true;
-            if (mm != mode::json) c.m = mm;
+            if (mm != mode::json)
+                c.m = mm;
             continue;
         }
         if (mode_given)
@@ -159,7 +170,8 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
         mode_given = true;
     }
     size_t wanted = c.m == mode::diff || c.m == mode::compat ? 2 : 1;
-    if (c.operands.size() < wanted) return usage_error(err, c.operands.empty() ? "no FILE given" : "too few FILEs given");
+    if (c.operands.size() < wanted)
+        return usage_error(err, c.operands.empty() ? "no FILE given" : "too few FILEs given");
     if (c.operands.size() > wanted)
         return usage_error(err, wanted == 1 ? "more than one FILE given" : "more than two FILEs given");
     return std::nullopt;
@@ -167,8 +179,10 @@ std::optional<int> parse(int argc, char **argv, command &c, text_sink &out, FILE
 
 int run(int argc, char **argv, text_sink &out, FILE *err) {
     command c;
-    if (auto status = parse(argc, argv, c, out, err)) return *status;
-    if (c.m == mode::diff || c.m == mode::compat) return compare(c, out, err);
+    if (auto status = parse(argc, argv, c, out, err))
+        return *status;
+    if (c.m == mode::diff || c.m == mode::compat)
+        return compare(c, out, err);
     return inspect(c.m, c.operands[0], out, err);
 }
 } // namespace

@@ -23,8 +23,8 @@ struct block_markers {
     std::string start, start_end, end;
 };
 extern const block_markers markdown_markers, roff_markers;
-std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks,
-                        std::string &missing, const block_markers &markers = markdown_markers);
+std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks, std::string &missing,
+                        const block_markers &markers = markdown_markers);
 
 std::string vim_syntax();
 std::string textmate_grammar();

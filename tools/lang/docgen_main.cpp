@@ -78,8 +78,8 @@ int main(int argc, char **argv) {
         if (readable && current == f.text)
             continue;
         if (check) {
-            std::fprintf(stderr, "%s: out of date with the tables it is generated from; run qecfg_docgen %s\n", path.c_str(),
-                         dir.c_str());
+            std::fprintf(stderr, "%s: out of date with the tables it is generated from; run qecfg_docgen %s\n",
+                         path.c_str(), dir.c_str());
             status = 1;
         } else if (!write_file(path, f.text)) {
             std::fprintf(stderr, "qecfg_docgen: cannot write %s\n", path.c_str());

@@ -91,8 +91,8 @@ std::map<std::string, std::string> reference_blocks() {
 const block_markers markdown_markers = {"<!-- generated: ", " -->", "<!-- end generated -->"};
 const block_markers roff_markers = {".\\\" generated: ", "", ".\\\" end generated"};
 
-std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks,
-                        std::string &missing, const block_markers &markers) {
+std::string fill_blocks(const std::string &text, const std::map<std::string, std::string> &blocks, std::string &missing,
+                        const block_markers &markers) {
     std::istringstream in(text);
     std::ostringstream out;
     std::map<std::string, bool> seen;
