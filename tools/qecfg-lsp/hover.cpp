@@ -49,7 +49,8 @@ std::string read_as(zu_data_type_t type, const std::string &text) {
 std::string bounds_of(const check::stanza &s) {
     std::string text;
     for (const check::statement &st : s.statements)
-        if (!st.skipped && (st.keyword() == "ValidValue" || st.keyword() == "ValidStateValue" || st.keyword() == "Range"))
+        if (!st.skipped &&
+            (st.keyword() == "ValidValue" || st.keyword() == "ValidStateValue" || st.keyword() == "Range"))
             text += (text.empty() ? "" : ", ") + std::string(st.keyword()) + "=" + st.text();
     return text.empty() ? "" : "\nIt must lie in " + text + "\n";
 }

@@ -59,9 +59,9 @@ symbol class_symbol(const document &d, const std::vector<const check::stanza *> 
         } else if (s->type && s->type->structured_data) {
             symbol element = stanza_symbol(d, *s, FIELD);
             if (!run || !previous || previous->type != s->type) {
-                size_t owner = s->is(ST_PATTR_SD) || s->is(ST_DATTR_SD)          ? attr
+                size_t owner = s->is(ST_PATTR_SD) || s->is(ST_DATTR_SD)            ? attr
                                : s->is(ST_ACTION_IN_SD) || s->is(ST_ACTION_OUT_SD) ? action
-                                                                                                 : SIZE_MAX;
+                                                                                   : SIZE_MAX;
                 run_owner = owner == SIZE_MAX ? &c : &c.children[owner];
                 run_owner->children.push_back(
                     symbol{std::string(s->header), "structured data", STRUCT, element.range, element.selection, {}});
@@ -123,8 +123,7 @@ struct named_thing {
     std::vector<const check::statement *> definitions, uses;
 };
 
-std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v,
-                                               std::string_view value) {
+std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v, std::string_view value) {
     std::vector<const check::statement *> out;
     for (const check::statement *st : v)
         if (st->value() == value)
