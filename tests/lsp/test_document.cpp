@@ -100,20 +100,25 @@ TEST(LspDocument, ModelAfterEditsEqualsAFreshReading) {
 }
 
 // The model refers to its document's own text: a copy or a moved document
-// does not read the text it came from, which may change or go.
+// does not read the text it came from, which may change or go (a short text
+// lies inside the document object itself).
 TEST(LspDocument, CopiedAndMovedDocumentsReadTheirOwnText) {
-    auto original = std::make_unique<document>("u", "ControlDefinition\n Version=1.0\n", 1);
-    original->model();
-    document copy(*original);
-    document moved(std::move(*original));
-    original.reset();
-    ASSERT_EQ(copy.model().statements.size(), 1u);
-    EXPECT_EQ(copy.model().statements[0].value(), "1.0");
-    ASSERT_EQ(moved.model().statements.size(), 1u);
-    EXPECT_EQ(moved.model().statements[0].value(), "1.0");
-    copy.replace({27, 30}, "2.5", 2);
-    moved = copy;
-    EXPECT_EQ(moved.model().statements[0].value(), "2.5");
+    for (const std::string text : {"ControlDefinition\n Version=1.0\n", "X\n V=1.0\n"}) {
+        auto original = std::make_unique<document>("u", text, 1);
+        original->model();
+        document copy(*original);
+        document moved(std::move(*original));
+        original.reset();
+        ASSERT_EQ(moved.model().statements.size(), 1u) << text;
+        EXPECT_EQ(moved.model().statements[0].value(), "1.0");
+        moved.replace({0, text.size()}, "", 2);
+        EXPECT_TRUE(moved.model().statements.empty());
+        ASSERT_EQ(copy.model().statements.size(), 1u);
+        EXPECT_EQ(copy.model().statements[0].value(), "1.0");
+        moved = copy;
+        ASSERT_EQ(moved.model().statements.size(), 1u);
+        EXPECT_EQ(moved.model().statements[0].value(), "1.0");
+    }
 }
 
 } // namespace
