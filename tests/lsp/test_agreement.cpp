@@ -29,17 +29,25 @@ int compiler_line(const std::string &text, int line, int character) {
     return std::max(piece, 1);
 }
 
-// The server's diagnostics in the checker's form.
+// Where a range starts, as the checker prints a place: the file, and the
+// compiler line unless the range is the empty one at the file's start.
+std::string place_of(const std::string &text, const json &range) {
+    const json &start = range["start"];
+    bool whole_file = start == range["end"] && start["line"] == 0 && start["character"] == 0;
+    return "input.src" +
+           (whole_file ? "" : ":" + std::to_string(compiler_line(text, start["line"], start["character"])));
+}
+
+// The server's diagnostics in the checker's form, each followed by its
+// related places as notes.
 std::string as_checker_prints(const std::string &text, const json &diagnostics) {
     std::string out;
     for (const json &d : diagnostics) {
-        const json &start = d["range"]["start"];
-        bool whole_file = start == d["range"]["end"] && start["line"] == 0 && start["character"] == 0;
-        std::string where =
-            whole_file ? "" : ":" + std::to_string(compiler_line(text, start["line"], start["character"]));
-        out += "input.src" + where + (d["severity"] == 1 ? ": error: " : ": warning: ") +
+        out += place_of(text, d["range"]) + (d["severity"] == 1 ? ": error: " : ": warning: ") +
                d["message"].get<std::string>() + (d.contains("code") ? " [" + d["code"].get<std::string>() + "]" : "") +
                "\n";
+        for (const json &note : d.value("relatedInformation", json::array()))
+            out += place_of(text, note["location"]["range"]) + ": note: " + note["message"].get<std::string>() + "\n";
     }
     return out;
 }

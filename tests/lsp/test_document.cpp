@@ -2,6 +2,8 @@
 // 254-character pieces against document lines.
 #include <gtest/gtest.h>
 
+#include <memory>
+
 #include "document.h"
 #include "lsp_support.h"
 
@@ -34,7 +36,7 @@ TEST(LspDocument, IncrementalEditsKeepIndexesTrue) {
     EXPECT_EQ(d.line(1), "ResourceClass");
     EXPECT_EQ(d.model().stanzas.size(), 2u);
     EXPECT_EQ(d.model().stanzas[0].statements.size(), 0u);
-    EXPECT_EQ(d.model().stanzas[1].statements[0].value, "2.0");
+    EXPECT_EQ(d.model().stanzas[1].statements[0].value(), "2.0");
     EXPECT_EQ(d.version(), 3);
 }
 
@@ -71,7 +73,7 @@ bool same_model(const check::source_model &a, const check::source_model &b) {
             return false;
         for (size_t j = 0; j < x.statements.size(); j++) {
             const check::statement &s = x.statements[j], &t = y.statements[j];
-            if (s.line != t.line || s.keyword != t.keyword || s.value != t.value || s.skipped != t.skipped ||
+            if (s.line != t.line || s.keyword() != t.keyword() || s.value() != t.value() || s.skipped != t.skipped ||
                 s.row != t.row)
                 return false;
         }
@@ -79,8 +81,7 @@ bool same_model(const check::source_model &a, const check::source_model &b) {
     return true;
 }
 
-// Edits within a line keep the model equal to a fresh reading of the text,
-// whether the statement is re-read alone or the whole text is.
+// After edits within a line, the model is a fresh reading of the new text.
 TEST(LspDocument, ModelAfterEditsEqualsAFreshReading) {
     std::string text = slurp(QECFG_SOURCE_DIR "/examples/disk.src");
     document d("u", text, 1);
@@ -95,6 +96,28 @@ TEST(LspDocument, ModelAfterEditsEqualsAFreshReading) {
         int to = std::min(len, from + int(seed >> 20) % 3);
         d.replace({d.offset_of({line, from}), d.offset_of({line, to})}, inserts[(seed >> 12) % 10], i + 2);
         ASSERT_TRUE(same_model(d.model(), check::read_model(d.text()))) << "edit " << i << " on line " << line;
+    }
+}
+
+// The model refers to its document's own text: a copy or a moved document
+// does not read the text it came from, which may change or go (a short text
+// lies inside the document object itself).
+TEST(LspDocument, CopiedAndMovedDocumentsReadTheirOwnText) {
+    for (const std::string text : {"ControlDefinition\n Version=1.0\n", "X\n V=1.0\n"}) {
+        auto original = std::make_unique<document>("u", text, 1);
+        original->model();
+        document copy(*original);
+        document moved(std::move(*original));
+        original.reset();
+        ASSERT_EQ(moved.model().statements.size(), 1u) << text;
+        EXPECT_EQ(moved.model().statements[0].value(), "1.0");
+        moved.replace({0, text.size()}, "", 2);
+        EXPECT_TRUE(moved.model().statements.empty());
+        ASSERT_EQ(copy.model().statements.size(), 1u);
+        EXPECT_EQ(copy.model().statements[0].value(), "1.0");
+        moved = copy;
+        ASSERT_EQ(moved.model().statements.size(), 1u);
+        EXPECT_EQ(moved.model().statements[0].value(), "1.0");
     }
 }
 

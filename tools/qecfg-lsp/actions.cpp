@@ -105,14 +105,14 @@ void statement_fixes(fix_context &fx, const check::stanza &s, const check::state
         std::vector<std::string> rows;
         for (const lang::statement_row &r : s.type->rows)
             rows.push_back(r.name);
-        replace_word(fx, p.keyword, st.keyword, rows);
+        replace_word(fx, p.keyword, std::string(st.keyword()), rows);
         return;
     }
     using lang::value_kind;
     value_kind kind = st.row->kind;
     if ((kind == value_kind::data_type || kind == value_kind::element_type) &&
-        lang::data_type_named(st.value) == ZU_UNKNOWN) {
-        replace_word(fx, p.value, st.value, lang::data_type_names());
+        lang::data_type_named(st.text()) == ZU_UNKNOWN) {
+        replace_word(fx, p.value, st.text(), lang::data_type_names());
     } else if (kind == value_kind::properties) {
         std::vector<std::string> words;
         for (int i = 0; i < st.row->props_count; i++)
@@ -126,22 +126,22 @@ void statement_fixes(fix_context &fx, const check::stanza &s, const check::state
         }
     } else if ((kind == value_kind::default_value || kind == value_kind::valid_value ||
                 kind == value_kind::initial_value) &&
-               lang::element_type_of(type) == ZU_BINARY_PTR && hex_digits(st.value)) {
+               lang::element_type_of(type) == ZU_BINARY_PTR && hex_digits(st.text())) {
         size_t at = fx.d.text()[p.value.from] == '"' ? p.value.from + 1 : p.value.from;
-        add(fx, "Write '" + st.value + "' as hexadecimal: 0x" + st.value, p.value,
-            json::array({edit(fx.d, {at, at}, "0x")}), st.value[0] == '0');
+        add(fx, "Write '" + st.text() + "' as hexadecimal: 0x" + st.text(), p.value,
+            json::array({edit(fx.d, {at, at}, "0x")}), st.text()[0] == '0');
     }
 }
 
 void stanza_fixes(fix_context &fx, const check::stanza &s, int first, int last) {
     if (!s.type) {
         if (s.line >= first && s.line <= last)
-            replace_word(fx, fx.d.parts(s.line).keyword, s.header, stanza_names());
+            replace_word(fx, fx.d.parts(s.line).keyword, std::string(s.header), stanza_names());
         return;
     }
     missing_required(fx, s);
     const check::statement *type_stmt = s.first("DataType");
-    zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->value) : ZU_UNKNOWN;
+    zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->text()) : ZU_UNKNOWN;
     repeated_default(fx, s, type);
     for (const check::statement &st : s.statements)
         if (st.line >= first && st.line <= last && !st.skipped)

@@ -40,7 +40,7 @@ json statement_names(const check::stanza &s, int line) {
                 continue;
             bool given = false;
             for (const check::statement &st : s.statements)
-                given = given || (st.line != line && !st.skipped && st.keyword == r.name);
+                given = given || (st.line != line && !st.skipped && st.keyword() == r.name);
             if (!given || r.repeatable)
                 items.push_back(item(r.name, optional ? FIELD : KEYWORD, r.name + "=", sort_key(n++)));
         }
@@ -59,8 +59,8 @@ std::vector<std::string> values_of(const std::vector<const check::statement *> &
     std::set<std::string> seen;
     std::vector<std::string> v;
     for (const check::statement *st : statements)
-        if (seen.insert(st->value).second)
-            v.push_back(st->value);
+        if (seen.insert(st->text()).second)
+            v.push_back(st->text());
     return v;
 }
 

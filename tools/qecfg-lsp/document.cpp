@@ -30,44 +30,32 @@ document::document(std::string uri, std::string text, int version)
     reindex();
 }
 
+document::document(const document &other)
+    : uri_(other.uri_), text_(other.text_), version_(other.version_), line_starts_(other.line_starts_),
+      piece_starts_(other.piece_starts_) {}
+
+document::document(document &&other) noexcept
+    : uri_(std::move(other.uri_)), text_(std::move(other.text_)), version_(other.version_),
+      line_starts_(std::move(other.line_starts_)), piece_starts_(std::move(other.piece_starts_)) {
+    other.model_stale_ = true;
+}
+
+document &document::operator=(document other) noexcept {
+    std::swap(uri_, other.uri_);
+    std::swap(text_, other.text_);
+    std::swap(version_, other.version_);
+    std::swap(line_starts_, other.line_starts_);
+    std::swap(piece_starts_, other.piece_starts_);
+    model_stale_ = true;
+    return *this;
+}
+
 void document::replace(byte_span span, const std::string &with, int version) {
     span.to = std::min(span.to, text_.size());
     span.from = std::min(span.from, span.to);
-    bool within_line = std::memchr(text_.data() + span.from, '\n', span.to - span.from) == nullptr &&
-                       with.find('\n') == std::string::npos && line_is_one_piece(span.from);
     text_.replace(span.from, span.to - span.from, with);
     version_ = version;
-    bool fresh = !model_stale_;
     reindex();
-    // Typing inside a statement re-reads that statement, not the document.
-    if (fresh && within_line && line_is_one_piece(span.from) && reread_statement(piece_at(span.from)))
-        model_stale_ = false;
-}
-
-bool document::line_is_one_piece(size_t offset) const {
-    int l = position_of(offset).line;
-    return line(l).size() + 1 <= lang::READ_PIECE;
-}
-
-bool document::reread_statement(int piece) {
-    auto after = std::upper_bound(model_.stanzas.begin(), model_.stanzas.end(), piece,
-                                  [](int l, const check::stanza &s) { return l < s.line; });
-    if (after == model_.stanzas.begin())
-        return false;
-    check::stanza &s = *(after - 1);
-    auto st = std::find_if(s.statements.begin(), s.statements.end(),
-                           [&](const check::statement &x) { return x.line == piece; });
-    piece_parts p = parts(piece);
-    if (st == s.statements.end() || p.header)
-        return false;
-    // The statement read under its stanza's header, as the reader reads it.
-    check::source_model one =
-        check::read_model(s.header + "\n" + text_.substr(p.piece.from, p.piece.to - p.piece.from));
-    if (one.stanzas.size() != 1 || one.stanzas[0].statements.size() != 1)
-        return false;
-    *st = std::move(one.stanzas[0].statements[0]);
-    st->line = piece;
-    return true;
 }
 
 void document::set_text(std::string text, int version) {

@@ -36,6 +36,10 @@ struct piece_parts {
 class document {
   public:
     document(std::string uri, std::string text, int version);
+    // The model refers to the text: a copy or a moved document reads its own.
+    document(const document &other);
+    document(document &&other) noexcept;
+    document &operator=(document other) noexcept;
 
     const std::string &uri() const { return uri_; }
     const std::string &text() const { return text_; }
@@ -60,10 +64,6 @@ class document {
 
   private:
     void reindex();
-    bool line_is_one_piece(size_t offset) const;
-    // Replaces the model's statement of a piece by a fresh reading of it;
-    // false when the piece is no statement of the model before or after.
-    bool reread_statement(int piece);
 
     std::string uri_;
     std::string text_;
@@ -71,7 +71,8 @@ class document {
     std::vector<size_t> line_starts_;
     std::vector<size_t> piece_starts_;
     // Read when first asked for after a change: several changes in one
-    // message re-read the text once.
+    // message re-read the text once. It holds views into text_, so any
+    // change of the text makes it stale.
     mutable check::source_model model_;
     mutable bool model_stale_ = true;
 };

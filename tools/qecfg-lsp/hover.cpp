@@ -49,24 +49,25 @@ std::string read_as(zu_data_type_t type, const std::string &text) {
 std::string bounds_of(const check::stanza &s) {
     std::string text;
     for (const check::statement &st : s.statements)
-        if (!st.skipped && (st.keyword == "ValidValue" || st.keyword == "ValidStateValue" || st.keyword == "Range"))
-            text += (text.empty() ? "" : ", ") + st.keyword + "=" + st.value;
+        if (!st.skipped &&
+            (st.keyword() == "ValidValue" || st.keyword() == "ValidStateValue" || st.keyword() == "Range"))
+            text += (text.empty() ? "" : ", ") + std::string(st.keyword()) + "=" + st.text();
     return text.empty() ? "" : "\nIt must lie in " + text + "\n";
 }
 
 // How a value of the attribute's (or element's) data type is read.
 std::string typed_value(const check::stanza &s, const check::statement &st) {
     const check::statement *type_stmt = s.first("DataType");
-    zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->value) : ZU_UNKNOWN;
+    zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->text()) : ZU_UNKNOWN;
     if (type == ZU_UNKNOWN)
         return "The stanza gives no known DataType to read the value with.\n";
     bool pair = st.row->kind == lang::value_kind::range || st.row->kind == lang::value_kind::valid_value;
-    size_t comma = st.value.find(',');
+    size_t comma = st.text().find(',');
     zu_data_type_t element = lang::element_type_of(type);
     bool numeric = element >= ZU_INT32 && element <= ZU_FLOAT64;
     if (!pair || comma == std::string::npos || !numeric)
-        return read_as(type, st.value);
-    return read_as(type, st.value.substr(0, comma)) + "\n" + read_as(type, st.value.substr(comma + 1));
+        return read_as(type, st.text());
+    return read_as(type, st.text().substr(0, comma)) + "\n" + read_as(type, st.text().substr(comma + 1));
 }
 
 std::string value_text(const check::stanza &s, const check::statement &st, const document &d, const cursor &c) {
@@ -76,11 +77,11 @@ std::string value_text(const check::stanza &s, const check::statement &st, const
     switch (st.row->kind) {
     case value_kind::data_type:
     case value_kind::element_type: {
-        zu_data_type_t t = lang::data_type_named(st.value);
+        zu_data_type_t t = lang::data_type_named(st.text());
         std::string what = t == ZU_UNKNOWN     ? "names no data type"
                            : lang::is_array(t) ? std::string("is an array of ") + zuTypeStr[lang::element_type_of(t)]
                                                : "is a data type";
-        return "`" + st.value + "` " + what + "\n\n" + data_type_reference();
+        return "`" + st.text() + "` " + what + "\n\n" + data_type_reference();
     }
     case value_kind::variable_type: return variable_type_reference();
     case value_kind::properties: {
@@ -93,17 +94,17 @@ std::string value_text(const check::stanza &s, const check::statement &st, const
     }
     case value_kind::permission: return permission_reference();
     case value_kind::version: {
-        uint32_t v = lang::version_number(st.value);
-        return "`" + st.value + "` is read as the version " + std::to_string(v >> 24) + "." +
+        uint32_t v = lang::version_number(st.text());
+        return "`" + st.text() + "` is read as the version " + std::to_string(v >> 24) + "." +
                std::to_string((v >> 16) & 255) + "." + std::to_string((v >> 8) & 255) + "." + std::to_string(v & 255) +
-               "\n\n" + statement_reference(type, st.keyword);
+               "\n\n" + statement_reference(type, st.keyword());
     }
     case value_kind::valid_value:
-    case value_kind::range: return typed_value(s, st) + "\n" + statement_reference(type, st.keyword);
+    case value_kind::range: return typed_value(s, st) + "\n" + statement_reference(type, st.keyword());
     case value_kind::default_value:
     case value_kind::initial_value:
-        return typed_value(s, st) + bounds_of(s) + "\n" + statement_reference(type, st.keyword);
-    default: return statement_reference(type, st.keyword);
+        return typed_value(s, st) + bounds_of(s) + "\n" + statement_reference(type, st.keyword());
+    default: return statement_reference(type, st.keyword());
     }
 }
 
@@ -113,7 +114,7 @@ std::string hover_text(const document &d, const cursor &c) {
     if (!c.statement || !c.statement->row || !c.stanza->type)
         return "";
     if (c.on_keyword)
-        return statement_reference(*c.stanza->type, c.statement->keyword);
+        return statement_reference(*c.stanza->type, c.statement->keyword());
     return c.on_value ? value_text(*c.stanza, *c.statement, d, c) : "";
 }
 

@@ -26,10 +26,10 @@ const char *const NAMING_KEYWORDS[] = {"Name", "ElementName", "VariableClass", "
 symbol stanza_symbol(const document &d, const check::stanza &s, symbol_kind kind) {
     piece_parts header = d.parts(s.line);
     byte_span end = s.statements.empty() ? header.piece : d.parts(s.statements.back().line).piece;
-    symbol sym{s.header, s.header, kind, {header.piece.from, end.to}, header.keyword, {}};
+    symbol sym{std::string(s.header), std::string(s.header), kind, {header.piece.from, end.to}, header.keyword, {}};
     for (const char *keyword : NAMING_KEYWORDS)
         if (const check::statement *st = s.first(keyword)) {
-            sym.name = st->value;
+            sym.name = st->text();
             sym.selection = value_span(d, *st);
             break;
         }
@@ -47,7 +47,7 @@ symbol class_symbol(const document &d, const std::vector<const check::stanza *> 
     symbol *run = nullptr, *run_owner = nullptr;
     const check::stanza *previous = nullptr;
     for (const check::stanza *s : cls) {
-        if (s->is("ResourceClass")) {
+        if (s->is(ST_RESOURCE_CLASS)) {
             symbol rc = stanza_symbol(d, *s, CLASS);
             if (s->first("Name"))
                 c.name = rc.name;
@@ -59,12 +59,12 @@ symbol class_symbol(const document &d, const std::vector<const check::stanza *> 
         } else if (s->type && s->type->structured_data) {
             symbol element = stanza_symbol(d, *s, FIELD);
             if (!run || !previous || previous->type != s->type) {
-                size_t owner = s->is("PAttrSDDefinition") || s->is("DAttrSDDefinition")          ? attr
-                               : s->is("ActionInSDDefinition") || s->is("ActionOutSDDefinition") ? action
-                                                                                                 : SIZE_MAX;
+                size_t owner = s->is(ST_PATTR_SD) || s->is(ST_DATTR_SD)            ? attr
+                               : s->is(ST_ACTION_IN_SD) || s->is(ST_ACTION_OUT_SD) ? action
+                                                                                   : SIZE_MAX;
                 run_owner = owner == SIZE_MAX ? &c : &c.children[owner];
                 run_owner->children.push_back(
-                    symbol{s->header, "structured data", STRUCT, element.range, element.selection, {}});
+                    symbol{std::string(s->header), "structured data", STRUCT, element.range, element.selection, {}});
                 run = &run_owner->children.back();
             }
             run->children.push_back(element);
@@ -84,8 +84,8 @@ std::vector<symbol> outline(const document &d) {
     for (const std::vector<const check::stanza *> &cls : m.classes())
         top.push_back(class_symbol(d, cls));
     for (const check::stanza &s : m.stanzas)
-        if (s.is("ClassToManagerMapping") || s.is("ResourceVariableClass"))
-            top.push_back(stanza_symbol(d, s, s.is("ClassToManagerMapping") ? MODULE : CONSTANT));
+        if (s.is(ST_CLASS_TO_MANAGER_MAPPING) || s.is(ST_RESOURCE_VARIABLE_CLASS))
+            top.push_back(stanza_symbol(d, s, s.is(ST_CLASS_TO_MANAGER_MAPPING) ? MODULE : CONSTANT));
     std::sort(top.begin(), top.end(), [](const symbol &a, const symbol &b) { return a.range.from < b.range.from; });
     return top;
 }
@@ -123,11 +123,10 @@ struct named_thing {
     std::vector<const check::statement *> definitions, uses;
 };
 
-std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v,
-                                               const std::string &value) {
+std::vector<const check::statement *> matching(const std::vector<const check::statement *> &v, std::string_view value) {
     std::vector<const check::statement *> out;
     for (const check::statement *st : v)
-        if (st->value == value)
+        if (st->value() == value)
             out.push_back(st);
     return out;
 }
@@ -136,13 +135,13 @@ bool thing_at(const document &d, const cursor &c, named_thing &thing) {
     if (!c.on_value || !c.statement || c.statement->skipped)
         return false;
     const check::stanza &s = *c.stanza;
-    const std::string &kw = c.statement->keyword, &value = c.statement->value;
-    if (kw == "VariableClass" && (s.is_dynamic() || s.is("ResourceVariableClass"))) {
+    std::string_view kw = c.statement->keyword(), value = c.statement->value();
+    if (kw == "VariableClass" && (s.is_dynamic() || s.is(ST_RESOURCE_VARIABLE_CLASS))) {
         thing = {matching(variable_class_definitions(d.model()), value),
                  matching(variable_class_uses(d.model()), value)};
         return true;
     }
-    if ((kw == "Locator" && s.is("ResourceClass")) || (kw == "Name" && s.is("PersistentResourceAttribute"))) {
+    if ((kw == "Locator" && s.is(ST_RESOURCE_CLASS)) || (kw == "Name" && s.is(ST_PERSISTENT_RESOURCE_ATTRIBUTE))) {
         std::vector<const check::stanza *> cls = class_holding(d.model(), c.piece);
         thing = {matching(locator_targets(cls), value), matching(locator_uses(cls), value)};
         return true;

@@ -39,7 +39,8 @@ std::string stanza_reference(const lang::stanza_type &s) {
     return "### " + s.name + "\n\n" + block("stanza " + s.name);
 }
 
-std::string statement_reference(const lang::stanza_type &s, const std::string &keyword) {
+std::string statement_reference(const lang::stanza_type &s, std::string_view keyword_view) {
+    std::string keyword(keyword_view);
     std::string row = "| `" + keyword + "` |";
     return "**" + keyword + "** (" + s.name + ")\n\n" +
            table_rows(block("stanza " + s.name), [&](const std::string &l) { return l.rfind(row, 0) == 0; });

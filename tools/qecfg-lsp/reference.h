@@ -4,6 +4,7 @@
 #define QECFG_LSP_REFERENCE_H
 
 #include <string>
+#include <string_view>
 
 #include "lang.h"
 
@@ -12,7 +13,7 @@ namespace lsp {
 // The statement table of a stanza type.
 std::string stanza_reference(const lang::stanza_type &s);
 // The table header and the row of one statement of a stanza type.
-std::string statement_reference(const lang::stanza_type &s, const std::string &keyword);
+std::string statement_reference(const lang::stanza_type &s, std::string_view keyword);
 // The table header and the row of the property words of a stanza type.
 std::string property_reference(const lang::stanza_type &s);
 std::string permission_reference();

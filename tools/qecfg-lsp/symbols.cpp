@@ -21,13 +21,13 @@ template <typename F> std::vector<const check::statement *> statements_where(con
 
 std::vector<const check::statement *> variable_class_definitions(const check::source_model &m) {
     return statements_where(m, [](const check::stanza &s, const check::statement &st) {
-        return s.is("ResourceVariableClass") && st.keyword == "VariableClass";
+        return s.is(ST_RESOURCE_VARIABLE_CLASS) && st.keyword() == "VariableClass";
     });
 }
 
 std::vector<const check::statement *> variable_class_uses(const check::source_model &m) {
     return statements_where(m, [](const check::stanza &s, const check::statement &st) {
-        return s.is_dynamic() && st.keyword == "VariableClass";
+        return s.is_dynamic() && st.keyword() == "VariableClass";
     });
 }
 
@@ -38,18 +38,18 @@ std::vector<const check::stanza *> class_holding(const check::source_model &m, i
         return cls;
     const check::stanza *first = &m.stanzas.front(), *end = first + m.stanzas.size();
     const check::stanza *start = at;
-    while (start > first && !start->is("ControlDefinition"))
+    while (start > first && !start->is(ST_CONTROL_DEFINITION))
         start--;
-    if (!start->is("ControlDefinition"))
+    if (!start->is(ST_CONTROL_DEFINITION))
         return cls;
-    for (const check::stanza *s = start; s < end && (s == start || !s->is("ControlDefinition")); s++)
+    for (const check::stanza *s = start; s < end && (s == start || !s->is(ST_CONTROL_DEFINITION)); s++)
         cls.push_back(s);
     return cls;
 }
 
 namespace {
 
-std::vector<const check::statement *> class_statements(const std::vector<const check::stanza *> &cls, const char *type,
+std::vector<const check::statement *> class_statements(const std::vector<const check::stanza *> &cls, int type,
                                                        const char *keyword) {
     std::vector<const check::statement *> v;
     for (const check::stanza *s : cls)
@@ -62,11 +62,11 @@ std::vector<const check::statement *> class_statements(const std::vector<const c
 } // namespace
 
 std::vector<const check::statement *> locator_targets(const std::vector<const check::stanza *> &cls) {
-    return class_statements(cls, "PersistentResourceAttribute", "Name");
+    return class_statements(cls, ST_PERSISTENT_RESOURCE_ATTRIBUTE, "Name");
 }
 
 std::vector<const check::statement *> locator_uses(const std::vector<const check::stanza *> &cls) {
-    return class_statements(cls, "ResourceClass", "Locator");
+    return class_statements(cls, ST_RESOURCE_CLASS, "Locator");
 }
 
 } // namespace lsp
