@@ -1,4 +1,5 @@
-// qecfg-fmt's command line: standard output, --check and -i.
+// qecfg-fmt's command line: standard output, --check and -i; both commands'
+// help and version.
 #include <fstream>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -43,6 +44,22 @@ TEST(FmtCli, PrintsChecksAndRewrites) {
     EXPECT_EQ(e2e::run(dir, QECFG_FMT_BIN, {"--check", "a.src", "b.src"}, {}).status, 0);
     EXPECT_EQ(e2e::run(dir, QECFG_FMT_BIN, {"missing.src"}, {}).status, 2);
     EXPECT_EQ(e2e::run(dir, QECFG_FMT_BIN, {"--bogus"}, {}).status, 2);
+    fs::remove_all(dir);
+}
+
+// Help and version go to standard output with status 0, for both commands.
+TEST(FmtCli, HelpAndVersionOfBothCommands) {
+    fs::path dir = work_dir();
+    for (const char *bin : {QECFG_FMT_BIN, QECFG_LSP_BIN}) {
+        std::string name = fs::path(bin).filename().string();
+        e2e::run_result r = e2e::run(dir, bin, {"--version"}, {});
+        EXPECT_EQ(r.status, 0) << name;
+        EXPECT_EQ(r.out, name + " " QECFG_VERSION "\n");
+        r = e2e::run(dir, bin, {"--help"}, {});
+        EXPECT_EQ(r.status, 0) << name;
+        EXPECT_EQ(r.out.rfind("usage: " + name + " ", 0), 0u) << r.out;
+        EXPECT_EQ(r.err, "");
+    }
     fs::remove_all(dir);
 }
 

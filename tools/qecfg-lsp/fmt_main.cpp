@@ -17,7 +17,9 @@ namespace {
 const char USAGE[] = "usage: qecfg-fmt [-i | --check] [FILE...]\n"
                      "  (no option)  write each formatted source to standard output\n"
                      "  -i           rewrite each file in place\n"
-                     "  --check      list the files that are not formatted; exit status 1 if any\n";
+                     "  --check      list the files that are not formatted; exit status 1 if any\n"
+                     "  -h, --help   show this help and exit\n"
+                     "  --version    show the version and exit\n";
 
 enum class mode { print, in_place, check };
 
@@ -80,9 +82,9 @@ int main(int argc, char **argv) {
         std::string a = argv[i];
         if (a == "-i" || a == "--check") {
             m = a == "-i" ? mode::in_place : mode::check;
-        } else if (a == "-h" || a == "--help") {
-            std::fputs(USAGE, stdout);
-            return 0;
+        } else if (a == "-h" || a == "--help" || a == "--version") {
+            std::fputs(a == "--version" ? "qecfg-fmt " QECFG_VERSION "\n" : USAGE, stdout);
+            return std::fflush(stdout) == 0 ? 0 : 2;
         } else if (a.size() > 1 && a[0] == '-') {
             std::fprintf(stderr, "qecfg-fmt: unknown option %s\n%s", a.c_str(), USAGE);
             return 2;
