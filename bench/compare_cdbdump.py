@@ -13,7 +13,6 @@ Prints the counts and the first differences; exit status 1 when any differ.
 """
 import argparse
 import concurrent.futures
-import importlib.util
 import os
 import random
 import struct
@@ -22,9 +21,8 @@ import sys
 import tempfile
 
 HERE = os.path.dirname(os.path.abspath(__file__))
-spec = importlib.util.spec_from_file_location("compare_builds", os.path.join(HERE, "compare_builds.py"))
-builds = importlib.util.module_from_spec(spec)
-spec.loader.exec_module(builds)
+sys.path.insert(0, HERE)
+import compare_builds as builds  # noqa: E402  (the sources and generator of the compiler's comparison)
 
 SINGLE = ([], ["--check"], ["--json"], ["--annotate"], ["--source"])
 # --diff --json and --compat --json are left out: their path parts are

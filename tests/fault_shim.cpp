@@ -34,8 +34,8 @@ fault_plan &plan() {
     static fault_plan p;
     if (!p.read && environ) {
         p.read = true;
-        if (const char *spec = std::getenv("QECFG_FAULT"))
-            std::sscanf(spec, "%31[^:]:%ld:%d", p.name, &p.at, &p.err);
+        if (const char *fault = std::getenv("QECFG_FAULT"))
+            std::sscanf(fault, "%31[^:]:%ld:%d", p.name, &p.at, &p.err);
     }
     return p;
 }

@@ -7,7 +7,7 @@
 
 namespace {
 
-const std::string URI = "file:///work/demo.src";
+const std::string URI = "file:///home/author/defs/demo.src";
 
 // Line numbers (0-based) are noted where tests use them.
 const std::string SOURCE = "ControlDefinition\n"           // 0
@@ -176,7 +176,7 @@ TEST(LspFeatures, SymbolsDefinitionsAndReferences) {
     refs = s.at("textDocument/references", URI, 11, 7, {{"context", {{"includeDeclaration", false}}}})["result"];
     ASSERT_EQ(refs.size(), 1u);
     EXPECT_EQ(refs[0]["range"]["start"]["line"], 8);
-    s.open("file:///work/other.src", SOURCE);
+    s.open("file:///home/author/defs/other.src", SOURCE);
     json ws = s.request("workspace/symbol", {{"query", "load"}})["result"];
     EXPECT_EQ(ws.size(), 2u);
 }
