@@ -6,24 +6,25 @@ const { LanguageClient, TransportKind } = require('vscode-languageclient/node');
 
 let client;
 
-function serverSettings() {
-  const config = vscode.workspace.getConfiguration('qecfg');
+function serverSettings(config) {
   return { warnings: config.get('warnings', {}), outputName: config.get('outputName', '') };
 }
 
-function activate(context) {
-  const command = vscode.workspace.getConfiguration('qecfg').get('server.path', 'qecfg-lsp');
+// The client starts the server; activation fails when the server cannot
+// be started, so that VS Code shows why.
+function activate() {
+  const config = vscode.workspace.getConfiguration('qecfg');
   // TransportKind.stdio passes --stdio, which the server accepts.
-  const serverOptions = { command, transport: TransportKind.stdio };
+  const serverOptions = { command: config.get('server.path', 'qecfg-lsp'), transport: TransportKind.stdio };
   const clientOptions = {
     documentSelector: [{ scheme: 'file', language: 'qecfg' }],
-    initializationOptions: serverSettings(),
+    initializationOptions: serverSettings(config),
     // Changes to the qecfg.* settings reach the server as
     // workspace/didChangeConfiguration with the settings under "qecfg".
     synchronize: { configurationSection: 'qecfg' },
   };
   client = new LanguageClient('qecfg-lsp', 'qecfg language server', serverOptions, clientOptions);
-  context.subscriptions.push(client.start());
+  return client.start();
 }
 
 function deactivate() {
