@@ -33,8 +33,10 @@ class read_cdb {
     testing::AssertionResult valid() const {
         if (error_ == CDB_OK)
             return testing::AssertionSuccess();
-        return testing::AssertionFailure()
-               << cdb_strerror(error_) << " (first violation at offset " << bad_offset_ << ")";
+        testing::AssertionResult failure = testing::AssertionFailure() << cdb_strerror(error_);
+        if (bad_offset_ != NO_OFFSET)
+            failure << " (first violation at offset " << bad_offset_ << ")";
+        return failure;
     }
     const cdb_t &db() const { return db_; }
     // The first class of the file.
@@ -60,7 +62,8 @@ class read_cdb {
     cdb_t db_{};
     cdb_class_t class_{};
     int error_ = CDB_OK;
-    size_t bad_offset_ = 0;
+    static constexpr size_t NO_OFFSET = ~size_t(0);
+    size_t bad_offset_ = NO_OFFSET; // set by a failed full check
 };
 
 // A text of the file, or a mark for one the reader could not give.

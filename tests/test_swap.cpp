@@ -7,6 +7,7 @@
 #include <fstream>
 #include <memory>
 #include <sstream>
+#include <tuple>
 
 #include "cdb_read_support.h"
 #include "cdbdump/cdb_visit.h"
