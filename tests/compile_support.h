@@ -64,27 +64,6 @@ template <typename F = void (*)(qecfg::options &)> compile_result compile_text(
     return r;
 }
 
-// The fields of a little-endian image.
-inline uint32_t u32_at(const std::string &b, size_t off) {
-    uint32_t v = 0;
-    for (int i = 3; i >= 0; i--)
-        v = (v << 8) | uint8_t(b.at(off + i));
-    return v;
-}
-inline uint16_t u16_at(const std::string &b, size_t off) {
-    return uint16_t(uint8_t(b.at(off)) | uint8_t(b.at(off + 1)) << 8);
-}
-
-// Without a variable class the class dsect is the first: behind the 80-byte
-// header and three 16-byte anchors (class, manager, map).
-constexpr size_t CLASS = CDB_HEADER_SIZE + 3 * CDB_ANCHOR_SIZE;
-static_assert(CLASS == 128);
-
-// The text at offset `off` of the first class's strings.
-inline std::string class_string_at(const std::string &cdb, uint32_t off) {
-    return std::string(cdb.c_str() + CLASS + u32_at(cdb, CLASS + offsetof(rsrc_class_t, u_rc_strings)) + off);
-}
-
 // A class and a map, to which a test appends its stanzas (15 lines).
 inline const std::string BASE_SOURCE = "ControlDefinition\n"
                                        "    FileVersion=1.0\n"

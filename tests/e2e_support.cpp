@@ -123,25 +123,6 @@ static uint64_t read_be(const std::string &b, size_t off, size_t width) {
     return v;
 }
 
-std::vector<std::string> check_cdb(const std::string &b, bool swapped) {
-    std::vector<std::string> f;
-    auto word = [&](size_t off) { return uint32_t(swapped ? read_be(b, off, 4) : read_le(b, off, 4)); };
-    if (b.size() < 80 || b.size() % 4) {
-        f.push_back("CDB of " + std::to_string(b.size()) + " bytes");
-        return f;
-    }
-    if (word(0) != b.size() - 4)
-        f.push_back("length field " + std::to_string(word(0)) + " for a file of " + std::to_string(b.size()));
-    if (word(8) != 0x666D7431)
-        f.push_back("format word wrong");
-    uint32_t x = 0;
-    for (size_t off = 0; off < b.size(); off += 4)
-        x ^= word(off);
-    if (x != 0)
-        f.push_back("words do not XOR to 0");
-    return f;
-}
-
 static std::string hex_text_bytes(const std::string &text) {
     std::string bytes, digits;
     for (const std::string &line : lines(text)) {
@@ -208,10 +189,6 @@ std::vector<std::string> check_outputs(const fs::path &dir, const fs::path &work
                 f.push_back(file + " differs from " + name);
         }
     }
-    for (const auto &e : fs::directory_iterator(work))
-        if (e.path().extension() == ".cdef")
-            for (const std::string &p : check_cdb(read_file(e.path()), read_file(e.path()).substr(8, 1) == "f"))
-                f.push_back(e.path().filename().string() + ": " + p);
     return f;
 }
 

@@ -31,14 +31,11 @@ run_result run(const std::filesystem::path &work, const std::string &program, co
 // Removes the working directory of a run and its captured output.
 void remove_run(const run_result &r);
 
-// Failures of the case's checks and of the general file checks.
+// Failures of the case's checks and expected files.
 std::vector<std::string> check_outputs(const std::filesystem::path &dir, const std::filesystem::path &work);
 
 // Every example source and every case's input.src, in order of their paths.
 std::vector<std::filesystem::path> all_sources();
-
-// The general properties of a CDB: its length field and its checksum.
-std::vector<std::string> check_cdb(const std::string &bytes, bool swapped);
 
 } // namespace e2e
 

@@ -5,6 +5,7 @@
 #include <sys/resource.h>
 #include <sys/wait.h>
 
+#include "cdb_read_support.h"
 #include "output_support.h"
 
 namespace {
@@ -35,30 +36,21 @@ TEST(Growth, EveryClassTableGrowsPastItsUnit) {
     const int attrs = 600, actions = 300;
     compile_result r = compile_text(big_source(attrs, actions));
     ASSERT_EQ(r.message, "");
-    const std::string &b = r.cdb;
-    const size_t cls = CLASS;
-    EXPECT_EQ(u16_at(b, cls + 168), attrs / 2); // class persistent attributes
-    EXPECT_EQ(u16_at(b, cls + 172), attrs / 2); // resource persistent attributes
-    EXPECT_EQ(u16_at(b, cls + 174), attrs);     // resource dynamic attributes
-    EXPECT_EQ(u16_at(b, cls + 178), actions);
-    size_t strings = cls + u32_at(b, cls + 160);
-    size_t vl = cls + u32_at(b, cls + 128), vv = cls + u32_at(b, cls + 152);
+    read_cdb f(r.cdb); // every table, list and body bounded by the full check
+    ASSERT_TRUE(f.valid());
+    EXPECT_EQ(cdb_attr_count(&f.cls(), CDB_PATTR_CLASS), uint32_t(attrs / 2));
+    EXPECT_EQ(cdb_attr_count(&f.cls(), CDB_PATTR), uint32_t(attrs / 2));
+    EXPECT_EQ(cdb_attr_count(&f.cls(), CDB_DATTR), uint32_t(attrs));
+    EXPECT_EQ(cdb_action_count(&f.cls(), 0), uint32_t(actions));
     // The last resource persistent attribute: its name, varieties, valid
     // values and its two-element array default, all intact.
-    size_t last = cls + u32_at(b, cls + 40) + 72 * size_t(attrs / 2 - 1);
+    cdb_attr_t last;
+    ASSERT_TRUE(f.attr(CDB_PATTR, attrs / 2 - 1, last));
     std::string n = std::to_string(attrs - 2);
-    EXPECT_STREQ(b.c_str() + strings + u32_at(b, last + 8), ("attribute_number_" + n).c_str());
-    size_t list = vl + u32_at(b, last + 40);
-    EXPECT_EQ(u32_at(b, list + 4), 2u);
-    EXPECT_EQ(u32_at(b, list + 12), uint32_t(attrs - 2));
-    size_t vals = vv + u32_at(b, last + 48);
-    EXPECT_EQ(u32_at(b, vals + 4), 2u);
-    EXPECT_STREQ(b.c_str() + strings + u32_at(b, vals + 8), ("a" + n).c_str());
-    EXPECT_STREQ(b.c_str() + strings + u32_at(b, vals + 8 + 24 + 8), "c");
-    size_t array = strings + u32_at(b, last + 24);
-    EXPECT_EQ(u32_at(b, array), 2u);
-    EXPECT_STREQ(b.c_str() + strings + u32_at(b, array + 8), ("first_" + n).c_str());
-    EXPECT_STREQ(b.c_str() + strings + u32_at(b, array + 16), "second");
+    EXPECT_EQ(text_or_none(cdb_attr_name(&last)), "attribute_number_" + n);
+    EXPECT_EQ(varieties_of(last), (variety_list{{1, attrs - 2}, {2, 3}}));
+    EXPECT_EQ(valid_values_of(last), (valid_list{{"\"a" + n + "\"", "\"b\"", 0}, {"\"c\"", "\"c\"", 0}}));
+    EXPECT_EQ(default_of(last), "[\"first_" + n + "\", \"second\"]");
 }
 
 std::string class_attributes(int n) {
@@ -72,7 +64,9 @@ std::string class_attributes(int n) {
 TEST(Growth, ACountHoldsAtMost65535Records) {
     compile_result full = compile_text(class_attributes(65535));
     ASSERT_EQ(full.message, "");
-    EXPECT_EQ(u16_at(full.cdb, CLASS + offsetof(rsrc_class_t, rc_num_pattrsC)), 65535);
+    read_cdb f(full.cdb);
+    ASSERT_TRUE(f.valid());
+    EXPECT_EQ(cdb_attr_count(&f.cls(), CDB_PATTR_CLASS), 65535u);
     compile_result over = compile_text(class_attributes(65536));
     EXPECT_EQ(over.message, "Too many records in table: ClassPattrsC\n");
     EXPECT_EQ(over.code, 1);

@@ -2,6 +2,7 @@
 // 254-character pieces that count as lines.
 #include <gtest/gtest.h>
 
+#include "cdb_read_support.h"
 #include "compile_support.h"
 
 namespace {
@@ -12,7 +13,9 @@ std::string class_name_with(const std::string &line) {
     src.replace(src.find("    Name=Test.Class\n"), 20, line + "\n");
     compile_result r = compile_text(src);
     EXPECT_EQ(r.message, "");
-    return r.has_output ? class_string_at(r.cdb, u32_at(r.cdb, CLASS + offsetof(rsrc_class_t, u_rc_name))) : "";
+    read_cdb f(r.cdb);
+    testing::AssertionResult valid = f.valid();
+    return valid ? text_or_none(cdb_class_name(&f.cls())) : valid.message();
 }
 
 TEST(Reader, CommentAndBlankLinesAreIgnored) {
@@ -26,7 +29,9 @@ TEST(Reader, CommentAfterANumberIsCut) {
     src.replace(src.find("Description=1"), 13, "Description=12 # twelve");
     compile_result r = compile_text(src);
     ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u16_at(r.cdb, CLASS + 210), 12);
+    read_cdb f(r.cdb);
+    ASSERT_TRUE(f.valid());
+    EXPECT_EQ(cdb_class_field(&f.cls(), CDB_CLASS_DSCR_MSGID), 12u);
 }
 
 TEST(Reader, CommentsAndQuotesInTheValue) {

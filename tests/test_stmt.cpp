@@ -2,11 +2,10 @@
 // permissions, varieties and valid values, as they land in the records.
 #include <gtest/gtest.h>
 
+#include "cdb_read_support.h"
 #include "compile_support.h"
 
 namespace {
-
-constexpr size_t FIRST = CLASS + sizeof(rsrc_class_t); // the first record behind the class record
 
 std::string pattr(const std::string &extra_required, const std::string &optional = "") {
     return BASE_SOURCE +
@@ -21,7 +20,10 @@ std::string stored_name(const std::string &statement) {
     src.replace(src.find("Name=a"), 6, statement);
     compile_result r = compile_text(src);
     EXPECT_EQ(r.message, "");
-    return r.has_output ? class_string_at(r.cdb, u32_at(r.cdb, FIRST + 8)) : "";
+    read_cdb f(r.cdb);
+    cdb_attr_t a;
+    testing::AssertionResult found = f.attr(CDB_PATTR, 0, a);
+    return found ? text_or_none(cdb_attr_name(&a)) : found.message();
 }
 
 TEST(Statement, ValueSyntax) {
@@ -38,14 +40,16 @@ TEST(Statement, IntegersAreConvertedLikeStrtolInBaseZero) {
         src.replace(src.find("Description=1\n    DisplayName=2\n    Id"), 13, descr);
         return compile_text(src);
     };
-    compile_result r = with("Id=0x10", "Description=abc");
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 32), 16u);
-    EXPECT_EQ(u16_at(r.cdb, FIRST + 16), 0u);
-    r = with("Id=12abc", "Description=070000");
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 32), 12u);
-    EXPECT_EQ(u16_at(r.cdb, FIRST + 16), 070000 & 0xFFFF);
+    auto id_and_description = [](const compile_result &r) {
+        read_cdb f(r.cdb);
+        cdb_attr_t a;
+        EXPECT_EQ(r.message, "");
+        testing::AssertionResult found = f.attr(CDB_PATTR, 0, a);
+        EXPECT_TRUE(found);
+        return found ? std::pair(cdb_attr_id(&a), cdb_attr_field(&a, CDB_ATTR_DSCR_MSGID)) : std::pair(-1, 0u);
+    };
+    EXPECT_EQ(id_and_description(with("Id=0x10", "Description=abc")), std::pair(16, 0u));
+    EXPECT_EQ(id_and_description(with("Id=12abc", "Description=070000")), std::pair(12, 070000u & 0xFFFF));
 }
 
 TEST(Statement, EmptyQuotedValueIsIgnored) {
@@ -59,40 +63,39 @@ TEST(Statement, RequiredStatementsInAnyOrder) {
                                     "    DisplayName=2\n    Description=1\n    Name=a\n    GroupID=3\n";
     compile_result r = compile_text(src);
     ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u16_at(r.cdb, FIRST + 22), 3);
+    read_cdb f(r.cdb);
+    cdb_attr_t a;
+    ASSERT_TRUE(f.attr(CDB_PATTR, 0, a));
+    EXPECT_EQ(cdb_attr_field(&a, CDB_ATTR_GROUP_ID), 3u);
 }
 
 TEST(Statement, PropertiesAreCombined) {
     compile_result r = compile_text(pattr("", "    Properties=Public,,ReadOnly\n"));
     ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 4), 0x21u | 0x4u); // and InvalForDefine
+    read_cdb f(r.cdb);
+    cdb_attr_t a;
+    ASSERT_TRUE(f.attr(CDB_PATTR, 0, a));
+    EXPECT_EQ(cdb_attr_field(&a, CDB_ATTR_PROPS), 0x21u | 0x4u); // and InvalForDefine
 }
 
 TEST(Statement, VarietiesInStatementOrder) {
     compile_result r = compile_text(pattr("    VarietyRange=7,3\n"));
     ASSERT_EQ(r.message, "");
-    size_t vl = CLASS + u32_at(r.cdb, CLASS + 128) + u32_at(r.cdb, FIRST + 40);
-    EXPECT_EQ(u32_at(r.cdb, vl), 0x43444267u);
-    EXPECT_EQ(u32_at(r.cdb, vl + 4), 2u);
-    EXPECT_EQ(u32_at(r.cdb, vl + 8), 1u);
-    EXPECT_EQ(u32_at(r.cdb, vl + 12), 1u);
-    EXPECT_EQ(u32_at(r.cdb, vl + 16), 7u);
-    EXPECT_EQ(u32_at(r.cdb, vl + 20), 3u);
+    read_cdb f(r.cdb); // the full check has seen the list's identifier word
+    cdb_attr_t a;
+    ASSERT_TRUE(f.attr(CDB_PATTR, 0, a));
+    EXPECT_EQ(varieties_of(a), (variety_list{{1, 1}, {7, 3}}));
 }
 
 TEST(Statement, ValidValuesAndDisplayNames) {
     compile_result r = compile_text(
         pattr("", "    ValidValue=5\n    ValidValue=1,9\n    ValueDisplayName=6\n    ValueDisplayName=7\n"));
     ASSERT_EQ(r.message, "");
-    size_t vv = CLASS + u32_at(r.cdb, CLASS + 152) + u32_at(r.cdb, FIRST + 48);
-    EXPECT_EQ(u32_at(r.cdb, vv), 0x43444235u);
-    EXPECT_EQ(u32_at(r.cdb, vv + 4), 2u);
-    EXPECT_EQ(u32_at(r.cdb, vv + 8), 5u);
-    EXPECT_EQ(u32_at(r.cdb, vv + 16), 5u);
-    EXPECT_EQ(u16_at(r.cdb, vv + 24), 0);
-    EXPECT_EQ(u32_at(r.cdb, vv + 32), 1u);
-    EXPECT_EQ(u32_at(r.cdb, vv + 40), 9u);
-    EXPECT_EQ(u16_at(r.cdb, vv + 48), 7); // the second display name wins
+    read_cdb f(r.cdb);
+    cdb_attr_t a;
+    ASSERT_TRUE(f.attr(CDB_PATTR, 0, a));
+    // A single value is both ends; the second display name wins.
+    EXPECT_EQ(valid_values_of(a), (valid_list{{"5", "5", 0}, {"1", "9", 7}}));
 }
 
 std::string action(const std::string &optional) {
@@ -102,23 +105,28 @@ std::string action(const std::string &optional) {
            optional;
 }
 
+// The permissions and time-out of the resource action of `optional`.
+std::pair<uint32_t, uint32_t> permissions_and_timeout(const std::string &optional) {
+    compile_result r = compile_text(action(optional));
+    EXPECT_EQ(r.message, "");
+    read_cdb f(r.cdb);
+    cdb_action_t x;
+    testing::AssertionResult found = f.action(0, 0, x);
+    EXPECT_TRUE(found);
+    return found ? std::pair(cdb_action_field(&x, CDB_ACTION_PERMS), cdb_action_field(&x, CDB_ACTION_TIMEOUT))
+                 : std::pair(~0u, ~0u);
+}
+
 TEST(Statement, PermissionLooksAtTheFirstLetterOnly) {
-    compile_result r = compile_text(action("    Permission=xq\n"));
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 20), 0x200u);
-    r = compile_text(action("    Permission=rw\n"));
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 20), 0u);
-    r = compile_text(action("    TimeOut=30\n"));
-    ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 20), 0x40u);
-    EXPECT_EQ(u16_at(r.cdb, FIRST + 18), 30);
+    EXPECT_EQ(permissions_and_timeout("    Permission=xq\n").first, 0x200u);
+    EXPECT_EQ(permissions_and_timeout("    Permission=rw\n").first, 0u);
+    EXPECT_EQ(permissions_and_timeout("    TimeOut=30\n"), std::pair(0x40u, 30u));
 }
 
 TEST(Statement, ListActionsStoreNothing) {
     compile_result r = compile_text(pattr("", "    ListActionRsrc=x\n    ListActionClass=y\n"));
     ASSERT_EQ(r.message, "");
-    EXPECT_EQ(u32_at(r.cdb, FIRST + 24), 0u);
+    EXPECT_EQ(r.cdb, compile_text(pattr("")).cdb);
 }
 
 TEST(Statement, StatementAfterItsStanzaWasReplacedGoesToTheNewRecord) {
@@ -130,11 +138,18 @@ TEST(Statement, StatementAfterItsStanzaWasReplacedGoesToTheNewRecord) {
                       "    DataType=Int32\n    VariableType=Counter\n    VarietyRange=1,1\n    Range=3,4\n";
     compile_result r = compile_text(src);
     ASSERT_EQ(r.message, "");
-    size_t dattrC = CLASS + u32_at(r.cdb, CLASS + 32), dattr = CLASS + u32_at(r.cdb, CLASS + 48);
-    EXPECT_EQ(u32_at(r.cdb, dattrC + 40), 3u);
-    EXPECT_EQ(u32_at(r.cdb, dattrC + 48), 4u);
-    EXPECT_EQ(u32_at(r.cdb, dattr + 40), 0u);
-    EXPECT_EQ(u32_at(r.cdb, dattr + 48), 100u);
+    read_cdb f(r.cdb);
+    auto range_of = [&f](int kind) -> std::string {
+        cdb_attr_t a;
+        cdb_value_t low, high;
+        testing::AssertionResult found = f.attr(kind, 0, a);
+        if (!found)
+            return found.message();
+        int err = cdb_attr_range(&a, &low, &high);
+        return err == CDB_OK ? text_of(low) + ".." + text_of(high) : cdb_strerror(err);
+    };
+    EXPECT_EQ(range_of(CDB_DATTR_CLASS), "3..4");
+    EXPECT_EQ(range_of(CDB_DATTR), "0..100");
 }
 
 } // namespace
