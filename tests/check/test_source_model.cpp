@@ -64,8 +64,8 @@ TEST(SourceModel, CountsLongLinesInPiecesOf254) {
 }
 
 TEST(SourceModel, EndsWhereTheCompilerStopsReading) {
-    std::string text = "ResourceClass\n\tName=a\n\tDescription=1\0\nControlDefinition\n\tNoEquals\n";
-    check::source_model m = check::read_model(std::string_view(text.data(), text.size()));
+    const char text[] = "ResourceClass\n\tName=a\n\tDescription=1\0\nControlDefinition\n\tNoEquals\n";
+    check::source_model m = check::read_model(std::string_view(text, sizeof text - 1));
     ASSERT_EQ(m.stanzas.size(), 1u);
     EXPECT_EQ(m.stanzas[0].statements.size(), 1u); // a NUL byte ends the reading on its line
     m = check::read_model("ResourceClass\n\tNoEquals\n");
