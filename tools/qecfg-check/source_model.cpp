@@ -4,6 +4,8 @@
 #include "source_model.h"
 
 #include <algorithm>
+#include <cstring>
+
 #include "qecfg_source.h"
 
 namespace check {
@@ -90,27 +92,42 @@ statement statement_of(const source_line &l, const char *text) {
     return st;
 }
 
+size_t newlines(std::string_view text) {
+    size_t n = 0;
+    for (const char *p = text.data(), *end = p + text.size();
+         (p = static_cast<const char *>(std::memchr(p, '\n', size_t(end - p)))); p++)
+        n++;
+    return n;
+}
+
 } // namespace
 
 source_model read_model(std::string_view text) {
     source_model m;
     // Statements never outnumber lines; reserving once keeps the vector from
     // doubling past what it needs.
-    m.statements.reserve(size_t(std::count(text.begin(), text.end(), '\n')) + 1);
+    m.statements.reserve(newlines(text) + 1);
     std::vector<size_t> first_statement;
     m.last_line = int(read_source_lines(text, [&](const source_line &l) {
                           if (l.header) {
-                              m.stanzas.push_back(stanza{int(l.line), l.stanza, type_of(l.stanza),
-                                                         std::string_view(text.data() + l.offset, l.name_length), {}});
+                              m.stanzas.push_back(stanza{int(l.line),
+                                                         l.stanza,
+                                                         type_of(l.stanza),
+                                                         std::string_view(text.data() + l.offset, l.name_length),
+                                                         {}});
                               first_statement.push_back(m.statements.size());
                           } else if (!m.stanzas.empty()) {
                               m.statements.push_back(statement_of(l, text.data()));
                           }
                       }).last_line);
     first_statement.push_back(m.statements.size());
-    for (size_t i = 0; i < m.stanzas.size(); i++)
-        m.stanzas[i].statements = std::span<const statement>(m.statements.data() + first_statement[i],
-                                                             first_statement[i + 1] - first_statement[i]);
+    for (size_t i = 0; i < m.stanzas.size(); i++) {
+        stanza &st = m.stanzas[i];
+        st.statements = std::span<const statement>(m.statements.data() + first_statement[i],
+                                                   first_statement[i + 1] - first_statement[i]);
+        if (const statement *dt = st.first(kw::DataType))
+            st.data_type = lang::data_type_named(dt->text());
+    }
     return m;
 }
 

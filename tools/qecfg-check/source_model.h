@@ -20,8 +20,8 @@ namespace check {
 struct statement {
     const char *at = nullptr;                 // the keyword's first character in the source text
     const lang::statement_row *row = nullptr; // null when the stanza has no such statement
-    int line : 31 = 0; // at most 2^30 - 1: a longer source would be gigabytes of blank lines
-    bool skipped : 1 = false; // the value is exactly "": the compiler ignores the statement
+    int line : 31 = 0;                        // at most 2^30 - 1: a longer source would be gigabytes of blank lines
+    bool skipped : 1 = false;                 // the value is exactly "": the compiler ignores the statement
     // Lengths and offsets from `at`, within one piece of at most 254 characters.
     std::uint8_t keyword_length = 0, value_offset = 0, value_length = 0;
     std::uint8_t end_offset = 0; // where the statement's text ends, its comment cut off
@@ -42,6 +42,7 @@ struct stanza {
     const lang::stanza_type *type = nullptr; // null for a header that names no stanza type
     std::string_view header;
     std::span<const statement> statements;
+    zu_data_type_t data_type = ZU_UNKNOWN; // what its first DataType names; ZU_UNKNOWN for none
 
     bool is(int stanza_kind) const { return kind == stanza_kind; }
     bool is_attribute() const { return kind >= ST_PERSISTENT_RESOURCE_ATTRIBUTE && kind <= ST_DYNAMIC_CLASS_ATTRIBUTE; }

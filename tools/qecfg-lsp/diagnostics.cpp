@@ -1,4 +1,5 @@
-// Diagnostics come from the checker's own check of the text, so the server
+// Diagnostics come from the checker's own check of the text and of the
+// document's model (read once for every request after a change), so the server
 // and qecfg-check report the same error and warnings on the same lines.
 #include "diagnostics.h"
 
@@ -31,7 +32,7 @@ byte_span finding_span(const document &d, const check::diagnostic &where) {
 }
 
 json diagnostics_of(const document &d, const check::check_options &opt) {
-    check::check_report report = check::check_text(path_of_uri(d.uri()), d.text(), opt);
+    check::check_report report = check::check_text(path_of_uri(d.uri()), d.text(), opt, d.model());
     json list = json::array();
     for (const check::finding &f : report.findings) {
         json diag = {{"range", range_json(d, finding_span(d, f.where))},
