@@ -19,8 +19,8 @@ json related(const document &d, const std::vector<check::diagnostic> &notes) {
 } // namespace
 
 byte_span finding_span(const document &d, const check::diagnostic &where) {
-    if (where.line == 0) // the whole file: an empty range at its start
-        return {0, 0};
+    if (where.line == 0) // the whole file: shown on its first line
+        return {0, d.line(0).size()};
     piece_parts p = d.parts(where.line);
     if (p.whole.to == p.whole.from) // a line the reader ignores
         return p.piece;
@@ -41,6 +41,8 @@ json diagnostics_of(const document &d, const check::check_options &opt) {
                      {"message", f.where.text}};
         if (!f.name.empty())
             diag["code"] = f.name;
+        if (f.where.line == 0) // no line of the source is at fault
+            diag["data"] = {{"wholeFile", true}};
         if (!f.notes.empty())
             diag["relatedInformation"] = related(d, f.notes);
         list.push_back(std::move(diag));
