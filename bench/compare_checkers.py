@@ -8,16 +8,11 @@ status, standard output and standard error must agree.
 
 Prints the counts and the first differences; exit status 1 when any differ.
 """
-import argparse
-import concurrent.futures
 import os
-import random
-import shutil
 import subprocess
 import sys
-import tempfile
 
-from compare_builds import Source, corpus_sources, mutate
+from compare_builds import all_sources, arguments, compare_all
 
 MODES = ([], ["-Werror"])
 
@@ -45,30 +40,13 @@ def compare(args, item, scratch):
 
 
 def main():
-    ap = argparse.ArgumentParser()
-    ap.add_argument("old")
-    ap.add_argument("new")
-    ap.add_argument("--generated", type=int, default=2000)
-    ap.add_argument("--jobs", type=int, default=2)
-    args = ap.parse_args()
-    args.old, args.new = os.path.abspath(args.old), os.path.abspath(args.new)
-    items = corpus_sources()
-    for seed in range(args.generated):
-        rnd = random.Random(seed)
-        lines = Source(rnd).text()
-        items.append(("generated/%d" % seed, ("\n".join(lines) + "\n").encode()))
-        items.append(("mutated/%d" % seed, ("\n".join(mutate(rnd, lines)) + "\n").encode()))
-    scratch = tempfile.mkdtemp(prefix="qecfg-check-compare-")
-    differing, statuses = [], {}
-    try:
-        with concurrent.futures.ThreadPoolExecutor(args.jobs) as ex:
-            futures = [ex.submit(compare, args, item, os.path.join(scratch, str(i))) for i, item in enumerate(items)]
-            for f in futures:
-                d, status = f.result()
-                differing += d
-                statuses[status] = statuses.get(status, 0) + 1
-    finally:
-        shutil.rmtree(scratch, ignore_errors=True)
+    args = arguments()
+    items = all_sources(args.generated)
+    results = compare_all(args, items, compare, "qecfg-check-compare-")
+    differing = [d for diffs, _ in results for d in diffs]
+    statuses = {}
+    for _, status in results:
+        statuses[status] = statuses.get(status, 0) + 1
     print("sources: %d (by status of the first run: %s), runs per binary: %d, differing runs: %d"
           % (len(items), ", ".join("%s: %d" % kv for kv in sorted(statuses.items())), len(items) * len(MODES),
              len(differing)))
