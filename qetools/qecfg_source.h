@@ -34,8 +34,8 @@ struct source_line {
     char *value = nullptr; // a statement's value, without its quotes
     uint32_t name_column = 0, name_length = 0;
     uint32_t value_column = 0, value_length = 0;
-    uint32_t end_column = 0; // where the text of the header or statement ends, its comment cut off
-    uint64_t offset = 0;     // where the piece starts in the source, in bytes
+    uint32_t end_column = 0;          // where the text of the header or statement ends, its comment cut off
+    uint64_t offset = 0;              // where the piece starts in the source, in bytes
     bool skipped = false;             // the value is exactly "": nothing is stored
     const keyword_row *row = nullptr; // null when the stanza type has no such keyword
     // What is wrong with a statement as read: statement_before_stanza,
