@@ -227,7 +227,8 @@ def compare(args, item, scratch):
     return diffs, a[0] == 0
 
 
-def main():
+def arguments():
+    """The two binaries (as absolute paths), --generated and --jobs."""
     ap = argparse.ArgumentParser()
     ap.add_argument("old")
     ap.add_argument("new")
@@ -235,27 +236,43 @@ def main():
     ap.add_argument("--jobs", type=int, default=2)
     args = ap.parse_args()
     args.old, args.new = os.path.abspath(args.old), os.path.abspath(args.new)
+    return args
+
+
+def all_sources(generated):
+    """The corpus sources, then a generated and a mutated source per seed."""
     items = corpus_sources()
-    for seed in range(args.generated):
+    for seed in range(generated):
         rnd = random.Random(seed)
         lines = Source(rnd).text()
         items.append(("generated/%d" % seed, ("\n".join(lines) + "\n").encode()))
         items.append(("mutated/%d" % seed, ("\n".join(mutate(rnd, lines)) + "\n").encode()))
+    return items
+
+
+def compare_all(args, items, compare_one, prefix):
+    """compare_one(args, item, scratch) of every item, in args.jobs threads,
+    each with a scratch directory of its own; the results in order."""
+    scratch = tempfile.mkdtemp(prefix=prefix)
+    try:
+        with concurrent.futures.ThreadPoolExecutor(args.jobs) as ex:
+            futures = [ex.submit(compare_one, args, item, os.path.join(scratch, str(i)))
+                       for i, item in enumerate(items)]
+            return [f.result() for f in futures]
+    finally:
+        shutil.rmtree(scratch, ignore_errors=True)
+
+
+def main():
+    args = arguments()
+    items = all_sources(args.generated)
     # A NUL byte is refused on its line since the reader stopped cutting lines
     # there silently: such sources are not compared.
     with_nul = [name for name, src in items if b"\0" in src]
     items = [item for item in items if b"\0" not in item[1]]
-    scratch = tempfile.mkdtemp(prefix="qecfg-compare-")
-    differing, compiled = [], 0
-    try:
-        with concurrent.futures.ThreadPoolExecutor(args.jobs) as ex:
-            futures = [ex.submit(compare, args, item, os.path.join(scratch, str(i))) for i, item in enumerate(items)]
-            for f in futures:
-                d, ok = f.result()
-                differing += d
-                compiled += ok
-    finally:
-        shutil.rmtree(scratch, ignore_errors=True)
+    results = compare_all(args, items, compare, "qecfg-compare-")
+    differing = [d for diffs, _ in results for d in diffs]
+    compiled = sum(ok for _, ok in results)
     print("sources: %d (compiled: %d, refused: %d), runs per binary: %d, differing runs: %d"
           % (len(items), compiled, len(items) - compiled, len(items) * len(MODES), len(differing)))
     if with_nul:

@@ -27,6 +27,7 @@ class piece_reader {
     // reported through err.
     char *next(int &err) {
         nul_ = false;
+        start_ = taken_;
         if (pos_ == len_ && !refill(err))
             return nullptr;
         char *start = buf_.data() + pos_;
@@ -57,6 +58,8 @@ class piece_reader {
 
     // The last piece held a NUL byte, which would end it early.
     bool held_nul() const { return nul_; }
+    // Where the last piece starts in the input.
+    uint64_t start() const { return start_; }
 
   private:
     static constexpr size_t BUFFER_SIZE = 1 << 16;
@@ -75,6 +78,7 @@ class piece_reader {
     void advance(size_t n) {
         nul_ = nul_ || (nul_at_ >= pos_ && nul_at_ < pos_ + n);
         pos_ += n;
+        taken_ += n;
     }
 
     FILE *fp_;
@@ -82,6 +86,7 @@ class piece_reader {
     size_t pos_ = 0, len_ = 0;
     size_t nul_at_ = 0; // the first NUL byte of the buffer, or len_
     bool nul_ = false;
+    uint64_t taken_ = 0, start_ = 0; // bytes of the input handed out; where the last piece starts
     char line_[LINE_BUFFER];
 };
 
@@ -197,13 +202,15 @@ bool source_reader::next(source_line &out) {
             continue;
         if (piece[0] == ' ' || piece[0] == '\t') {
             read_statement(piece, out);
+            out.offset = pieces_->start();
             return true;
         }
         out = source_line{};
         out.header = true;
         out.line = line_;
         out.name = piece;
-        out.name_length = uint32_t(std::strlen(piece));
+        out.name_length = out.end_column = uint32_t(std::strlen(piece));
+        out.offset = pieces_->start();
         out.stanza = stanza_ = find_stanza_type(piece);
         headed_ = true;
         return true;
@@ -222,6 +229,7 @@ void source_reader::read_statement(char *piece, source_line &out) const {
     char *name = piece + std::strspn(piece, " \t");
     out.name = name;
     out.name_column = column(piece, name);
+    out.end_column = out.name_column + uint32_t(std::strlen(name));
     char *eq = std::strchr(name, '=');
     out.name_length = uint32_t(eq ? eq - name : std::strlen(name));
     if (!headed_) {
@@ -238,10 +246,12 @@ void source_reader::read_statement(char *piece, source_line &out) const {
     out.value_column = column(piece, value);
     if (std::strcmp(value, "\"\"") == 0) {
         out.skipped = true;
+        out.row = stanza_ >= 0 ? find_row(stanza_, name, out.name_length) : nullptr;
         return;
     }
     value = strip_quotes(value);
     if (!value) {
+        out.value_length = uint32_t(std::strlen(out.value)); // kept as written
         out.problem = msg::unmatched_quotes;
         return;
     }
@@ -281,4 +291,16 @@ source_model read_source_model(std::string_view text) {
     m.last_line = reader.last_line();
     m.stop = reader.stop();
     return m;
+}
+
+source_end read_source_lines(std::string_view text, const std::function<void(const source_line &)> &each) {
+    FILE *fp = open_memory_source(text);
+    if (!fp)
+        return {0, source_stop{msg::cannot_read, 0, errno}};
+    source_reader reader(fp);
+    source_line l;
+    while (reader.next(l))
+        each(l);
+    std::fclose(fp);
+    return {reader.last_line(), reader.stop()};
 }

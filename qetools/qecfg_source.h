@@ -12,6 +12,7 @@
 
 #include <cstdint>
 #include <cstdio>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -33,6 +34,8 @@ struct source_line {
     char *value = nullptr; // a statement's value, without its quotes
     uint32_t name_column = 0, name_length = 0;
     uint32_t value_column = 0, value_length = 0;
+    uint32_t end_column = 0;          // where the text of the header or statement ends, its comment cut off
+    uint64_t offset = 0;              // where the piece starts in the source, in bytes
     bool skipped = false;             // the value is exactly "": nothing is stored
     const keyword_row *row = nullptr; // null when the stanza type has no such keyword
     // What is wrong with a statement as read: statement_before_stanza,
@@ -97,6 +100,15 @@ struct source_model {
 };
 
 source_model read_source_model(std::string_view text);
+
+// Reads a source held in memory line by line for a tool that keeps its own
+// model: each header and statement goes to `each`. Returns what
+// read_source_model returns beside the stanzas.
+struct source_end {
+    uint64_t last_line = 0;
+    source_stop stop;
+};
+source_end read_source_lines(std::string_view text, const std::function<void(const source_line &)> &each);
 
 // Cuts comments and the newline off a piece of a source line; false when
 // nothing is left to process (a comment line or a line of blanks, tabs and

@@ -1,5 +1,5 @@
-// The checker reads a source into stanzas and statements with the
-// compiler's reader rules, so that its lines and values are the compiler's.
+// The checker's model is the compiler's reader's: its lines, stanza types,
+// keyword rows and values are the compiler's, kept as places in the text.
 #include <gtest/gtest.h>
 
 #include "source_model.h"
@@ -43,6 +43,10 @@ TEST(SourceModel, ReadsStanzasAndStatementsAsTheCompilerDoes) {
     EXPECT_EQ(m.stanzas[1].type, nullptr);
     ASSERT_EQ(m.stanzas[1].statements.size(), 1u);
     EXPECT_EQ(m.stanzas[1].statements[0].value(), "\"abc\\\""); // unmatched quotes: kept as written
+    // The text of a statement ends before its comment and trailing blanks.
+    const check::statement &described = rc.statements[1];
+    EXPECT_EQ(std::string_view(described.at, described.end_offset), "Description=12");
+    EXPECT_TRUE(described.has_equals());
     EXPECT_EQ(m.stanza_at(6), &rc);
     EXPECT_EQ(m.stanza_at(1), nullptr);
     EXPECT_EQ(m.last_line, 10);
@@ -57,6 +61,17 @@ TEST(SourceModel, CountsLongLinesInPiecesOf254) {
     EXPECT_EQ(m.stanzas[0].line, 2);
     EXPECT_EQ(m.stanzas[1].line, 3);
     EXPECT_EQ(m.last_line, 3);
+}
+
+TEST(SourceModel, EndsWhereTheCompilerStopsReading) {
+    const char text[] = "ResourceClass\n\tName=a\n\tDescription=1\0\nControlDefinition\n\tNoEquals\n";
+    check::source_model m = check::read_model(std::string_view(text, sizeof text - 1));
+    ASSERT_EQ(m.stanzas.size(), 1u);
+    EXPECT_EQ(m.stanzas[0].statements.size(), 1u); // a NUL byte ends the reading on its line
+    m = check::read_model("ResourceClass\n\tNoEquals\n");
+    ASSERT_EQ(m.statements.size(), 1u);
+    EXPECT_EQ(m.statements[0].keyword(), "NoEquals");
+    EXPECT_FALSE(m.statements[0].has_equals());
 }
 
 TEST(SourceModel, GroupsStanzasIntoClasses) {

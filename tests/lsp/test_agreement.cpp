@@ -30,10 +30,9 @@ int compiler_line(const std::string &text, int line, int character) {
 }
 
 // Where a range starts, as the checker prints a place: the file, and the
-// compiler line unless the range is the empty one at the file's start.
-std::string place_of(const std::string &text, const json &range) {
+// compiler line unless the finding is of the whole file.
+std::string place_of(const std::string &text, const json &range, bool whole_file) {
     const json &start = range["start"];
-    bool whole_file = start == range["end"] && start["line"] == 0 && start["character"] == 0;
     return "input.src" +
            (whole_file ? "" : ":" + std::to_string(compiler_line(text, start["line"], start["character"])));
 }
@@ -43,11 +42,12 @@ std::string place_of(const std::string &text, const json &range) {
 std::string as_checker_prints(const std::string &text, const json &diagnostics) {
     std::string out;
     for (const json &d : diagnostics) {
-        out += place_of(text, d["range"]) + (d["severity"] == 1 ? ": error: " : ": warning: ") +
-               d["message"].get<std::string>() + (d.contains("code") ? " [" + d["code"].get<std::string>() + "]" : "") +
-               "\n";
+        out += place_of(text, d["range"], d.value(json::json_pointer("/data/wholeFile"), false)) +
+               (d["severity"] == 1 ? ": error: " : ": warning: ") + d["message"].get<std::string>() +
+               (d.contains("code") ? " [" + d["code"].get<std::string>() + "]" : "") + "\n";
         for (const json &note : d.value("relatedInformation", json::array()))
-            out += place_of(text, note["location"]["range"]) + ": note: " + note["message"].get<std::string>() + "\n";
+            out += place_of(text, note["location"]["range"], false) + ": note: " + note["message"].get<std::string>() +
+                   "\n";
     }
     return out;
 }

@@ -53,11 +53,26 @@ TEST(LspDocument, LongLinesAreSeveralPieces) {
     EXPECT_EQ(st.value.to - st.value.from, 254u - 6u);
 }
 
+std::string text_of(const document &d, lsp::byte_span s) { return d.text().substr(s.from, s.to - s.from); }
+
 TEST(LspDocument, CommentsAndTrailingBlanksAreNoPartOfAStatement) {
-    document d("u", "ControlDefinition # starts\n  FileVersion=1.0  // why\n", 1);
+    document d("u",
+               "ControlDefinition # starts\n  FileVersion=1.0  // why\n# a comment\nResourceClass\n"
+               "\tName=\"a#b\" # c\n\tNoEquals\n",
+               1);
     lsp::piece_parts h = d.parts(1), st = d.parts(2);
-    EXPECT_EQ(d.text().substr(h.keyword.from, h.keyword.to - h.keyword.from), "ControlDefinition");
-    EXPECT_EQ(d.text().substr(st.value.from, st.value.to - st.value.from), "1.0");
+    EXPECT_EQ(text_of(d, h.keyword), "ControlDefinition");
+    EXPECT_EQ(text_of(d, st.value), "1.0");
+    EXPECT_EQ(text_of(d, st.whole), "  FileVersion=1.0");
+    lsp::piece_parts comment = d.parts(3);
+    EXPECT_FALSE(comment.header);
+    EXPECT_EQ(comment.whole.from, comment.whole.to);
+    EXPECT_EQ(text_of(d, comment.piece), "# a comment");
+    EXPECT_EQ(text_of(d, d.parts(5).value), "\"a#b\""); // the value as written, with its quotes
+    lsp::piece_parts bare = d.parts(6);
+    EXPECT_EQ(text_of(d, bare.keyword), "NoEquals");
+    EXPECT_EQ(bare.value.from, bare.keyword.to);
+    EXPECT_EQ(bare.value.to, bare.keyword.to);
 }
 
 } // namespace

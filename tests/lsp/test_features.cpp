@@ -87,10 +87,12 @@ TEST(LspFeatures, DiagnosticsPointAtTheValueOrKeywordAndFollowEdits) {
     EXPECT_EQ(d[0]["range"]["start"], json({{"line", 14}, {"character", 1}}));
     EXPECT_EQ(d[0]["range"]["end"], json({{"line", 14}, {"character", 4}}));
     EXPECT_FALSE(d[0].contains("code"));
-    // A source without a map: the whole file, an empty range at its start.
+    // A source without a map: the whole file, shown on its first line.
     d = s.change(URI, {{{"text", SOURCE.substr(0, SOURCE.find("ClassToManagerMapping"))}}});
     ASSERT_EQ(d.size(), 1u);
-    EXPECT_EQ(d[0]["range"]["start"], d[0]["range"]["end"]);
+    EXPECT_EQ(d[0]["range"]["start"], json({{"line", 0}, {"character", 0}}));
+    EXPECT_EQ(d[0]["range"]["end"], json({{"line", 0}, {"character", 17}}));
+    EXPECT_EQ(d[0]["data"]["wholeFile"], true);
     s.notify("textDocument/didClose", {{"textDocument", {{"uri", URI}}}});
     EXPECT_TRUE(s.last_diagnostics(URI).empty());
 }
@@ -220,12 +222,17 @@ TEST(LspFeatures, QuickFixesMendTheSource) {
     EXPECT_EQ(fix(s, replace_line(SOURCE, 5, "\tProperties=HasResorces"), 5, "Replace"), SOURCE);
     std::string missing = replace_line(replace_line(SOURCE, 14, ""), 12, "");
     std::string inserted = fix(s, missing, 11, "Insert the missing");
-    EXPECT_NE(inserted.find("PersistentResourceAttribute\n\tDescription=\n\tId=\n\tName=Size"), std::string::npos);
+    // Values that compile where one is knowable: a message id, the next free Id.
+    EXPECT_NE(inserted.find("PersistentResourceAttribute\n\tDescription=0\n\tId=1\n\tName=Size"), std::string::npos);
+    EXPECT_EQ(compile_text(inserted).code, 0) << inserted;
+    // No data type is knowable: a placeholder the compiler refuses until it is replaced.
+    std::string untyped = replace_line(SOURCE, 15, "");
+    EXPECT_NE(fix(s, untyped, 10, "Insert the missing").find("PersistentResourceAttribute\n\tDataType=TODO\n"),
+              std::string::npos);
     std::string binary = replace_line(replace_line(SOURCE, 15, "\tDataType=Binary"), 17, "\tDefaultValue=00ff");
     EXPECT_NE(fix(s, binary, 17, "Write").find("\tDefaultValue=0x00ff\n"), std::string::npos);
     std::string twice = replace_line(SOURCE, 17, "\tDefaultValue=9\n\tDefaultValue=10");
     EXPECT_EQ(fix(s, twice, 17, "Remove"), SOURCE);
-    // Each fixed source compiles (the inserted statements still need values).
     EXPECT_EQ(compile_text(SOURCE).code, 0);
 }
 

@@ -46,17 +46,23 @@ std::string default_output_name(const std::string &source) {
     return (dot == std::string::npos || dot == 0 ? base : base.substr(0, dot)) + ".cdef";
 }
 
+namespace {
+
 // The finding of the whole source when the check itself cannot go on.
 check_report trouble(std::string why) { return {2, {finding{severity::error, diagnostic{0, std::move(why)}, "", {}}}}; }
 
-check_report check_text(const std::string &name, const std::string &text, const check_options &opt) try {
+// `model` is the model of `text`, or null to read it after the compile, when
+// the compile's memory is given back.
+check_report check_with(const std::string &name, const std::string &text, const check_options &opt,
+                        const source_model *model) try {
     std::string output_name = opt.output_name.empty() ? default_output_name(name) : opt.output_name;
     qecfg::result r = compile(name, text, output_name);
     if (r.status != 0 && (r.status != 1 || ran_out_of_memory(r)))
         return trouble(without_source_name(r, name));
     check_report report;
     report.status = r.status;
-    source_model m = read_model(text);
+    source_model read;
+    const source_model &m = model ? *model : (read = read_model(text));
     if (r.status == 1) {
         explained e = explain_failure(r, m);
         report.findings.push_back(finding{severity::error, std::move(e.where), "", std::move(e.notes)});
@@ -64,12 +70,23 @@ check_report check_text(const std::string &name, const std::string &text, const 
     }
     std::vector<bool> enabled = opt.enabled.empty() ? default_warnings() : opt.enabled;
     enabled.resize(warning_checks().size(), false);
-    for (warning_finding &f : run_warnings(check_input{m, output_name}, enabled))
+    for (warning_finding &f : run_warnings(check_input{m, output_name, m.classes()}, enabled))
         report.findings.push_back(
             finding{severity::warning, std::move(f.found.where), f.name, std::move(f.found.notes)});
     return report;
 } catch (const std::bad_alloc &) {
     return trouble(OUT_OF_MEMORY);
+}
+
+} // namespace
+
+check_report check_text(const std::string &name, const std::string &text, const check_options &opt) {
+    return check_with(name, text, opt, nullptr);
+}
+
+check_report check_text(const std::string &name, const std::string &text, const check_options &opt,
+                        const source_model &model) {
+    return check_with(name, text, opt, &model);
 }
 
 } // namespace check

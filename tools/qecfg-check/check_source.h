@@ -35,6 +35,9 @@ inline constexpr const char OUT_OF_MEMORY[] = "out of memory";
 // Compiles `text` in memory with qecfg's rules (messages naming the source
 // `name`) and explains its failure or runs the enabled warnings.
 check_report check_text(const std::string &name, const std::string &text, const check_options &opt);
+// The same with the model of `text` read already (read_model(text)).
+check_report check_text(const std::string &name, const std::string &text, const check_options &opt,
+                        const source_model &model);
 
 // The compiler's message without the source's name where its row begins with
 // it: the checker puts the name in front itself.

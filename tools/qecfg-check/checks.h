@@ -11,7 +11,7 @@
 namespace check {
 
 // The data type a stanza's DataType names (ZU_UNKNOWN when it names none).
-zu_data_type_t type_of(const stanza &s);
+inline zu_data_type_t type_of(const stanza &s) { return s.data_type; }
 // A 32-bit number statement as the compiler stores it (strtol, base 0).
 std::uint32_t stored_identifier(const statement &st);
 

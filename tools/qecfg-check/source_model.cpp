@@ -1,12 +1,12 @@
-// Reading a source into stanzas and statements the way the compiler's reader
-// does: pieces of at most 254 characters, its comment rules, headers in the
-// first column, `Keyword=value` statements with their quotes removed. The
-// reader's rules only cut a piece short or skip into it, so every keyword and
-// value is a view into the source text.
+// The checker's model, filled from the compiler's reader: the reader frames
+// the pieces and matches the stanza types and keyword rows; the model keeps
+// where they lie in the text.
 #include "source_model.h"
 
 #include <algorithm>
 #include <cstring>
+
+#include "qecfg_source.h"
 
 namespace check {
 
@@ -70,35 +70,35 @@ std::vector<std::vector<const stanza *>> source_model::classes() const {
 
 namespace {
 
-// One piece of the source copied out, with the way back to the text.
-struct piece {
-    char chars[lang::READ_PIECE + 2];
-    const char *origin; // where chars[0] stands in the text
+const lang::stanza_type *type_of(int kind) {
+    return kind == NO_STANZA_TYPE ? nullptr : &lang::stanza_types()[size_t(kind)];
+}
 
-    const char *in_text(const char *p) const { return origin + (p - chars); }
-};
+// The language view of a keyword row: the same row of the same stanza type.
+const lang::statement_row *row_of(int kind, const keyword_row *row) {
+    return row ? &type_of(kind)->rows[size_t(row - stanza_defs[kind].rows)] : nullptr;
+}
 
-statement read_statement(const piece &pc, char *start, int number, const lang::stanza_type *in) {
+statement statement_of(const source_line &l, const char *text) {
     statement st;
-    st.line = number;
-    char *name = start + std::strspn(start, " \t");
-    char *eq = std::strchr(name, '=');
-    st.at = pc.in_text(name);
-    st.keyword_length = std::uint8_t(eq ? eq - name : std::strlen(name));
-    if (!eq)
-        return st;
-    st.skipped = std::strcmp(eq + 1, "\"\"") == 0;
-    char *value = lang::unquote(eq + 1);
-    if (!value)
-        value = eq + 1;
-    st.value_offset = std::uint8_t(value - name);
-    st.value_length = std::uint8_t(std::strlen(value));
-    if (in)
-        st.row = lang::find_row(*in, std::string(st.keyword()));
+    st.at = text + l.offset + l.name_column;
+    st.row = row_of(l.stanza, l.row);
+    st.line = int(l.line);
+    st.skipped = l.skipped;
+    st.keyword_length = std::uint8_t(l.name_length);
+    st.value_offset = std::uint8_t(l.value ? l.value_column - l.name_column : l.name_length);
+    st.value_length = std::uint8_t(l.value_length);
+    st.end_offset = std::uint8_t(l.end_column - l.name_column);
     return st;
 }
 
-int kind_of(const lang::stanza_type *t) { return t ? int(t - lang::stanza_types().data()) : NO_STANZA_TYPE; }
+size_t newlines(std::string_view text) {
+    size_t n = 0;
+    for (const char *p = text.data(), *end = p + text.size();
+         (p = static_cast<const char *>(std::memchr(p, '\n', size_t(end - p)))); p++)
+        n++;
+    return n;
+}
 
 } // namespace
 
@@ -106,34 +106,28 @@ source_model read_model(std::string_view text) {
     source_model m;
     // Statements never outnumber lines; reserving once keeps the vector from
     // doubling past what it needs.
-    m.statements.reserve(size_t(std::count(text.begin(), text.end(), '\n')) + 1);
+    m.statements.reserve(newlines(text) + 1);
     std::vector<size_t> first_statement;
-    piece pc;
-    for (size_t pos = 0; pos < text.size();) {
-        size_t len = std::min(text.size() - pos, lang::READ_PIECE);
-        const char *nl = static_cast<const char *>(std::memchr(text.data() + pos, '\n', len));
-        if (nl)
-            len = size_t(nl - (text.data() + pos)) + 1;
-        std::memcpy(pc.chars, text.data() + pos, len);
-        pc.chars[len] = '\0';
-        pc.origin = text.data() + pos;
-        pos += len;
-        m.last_line++;
-        if (!lang::strip_line_comment(pc.chars))
-            continue;
-        if (pc.chars[0] != ' ' && pc.chars[0] != '\t') {
-            const lang::stanza_type *t = lang::find_stanza(pc.chars);
-            m.stanzas.push_back(
-                stanza{m.last_line, kind_of(t), t, std::string_view(pc.origin, std::strlen(pc.chars)), {}});
-            first_statement.push_back(m.statements.size());
-        } else if (!m.stanzas.empty() && pc.chars[std::strspn(pc.chars, " \t")] != '\0') {
-            m.statements.push_back(read_statement(pc, pc.chars, m.last_line, m.stanzas.back().type));
-        }
-    }
+    m.last_line = int(read_source_lines(text, [&](const source_line &l) {
+                          if (l.header) {
+                              m.stanzas.push_back(stanza{int(l.line),
+                                                         l.stanza,
+                                                         type_of(l.stanza),
+                                                         std::string_view(text.data() + l.offset, l.name_length),
+                                                         {}});
+                              first_statement.push_back(m.statements.size());
+                          } else if (!m.stanzas.empty()) {
+                              m.statements.push_back(statement_of(l, text.data()));
+                          }
+                      }).last_line);
     first_statement.push_back(m.statements.size());
-    for (size_t i = 0; i < m.stanzas.size(); i++)
-        m.stanzas[i].statements = std::span<const statement>(m.statements.data() + first_statement[i],
-                                                             first_statement[i + 1] - first_statement[i]);
+    for (size_t i = 0; i < m.stanzas.size(); i++) {
+        stanza &st = m.stanzas[i];
+        st.statements = std::span<const statement>(m.statements.data() + first_statement[i],
+                                                   first_statement[i + 1] - first_statement[i]);
+        if (const statement *dt = st.first(kw::DataType))
+            st.data_type = lang::data_type_named(dt->text());
+    }
     return m;
 }
 

@@ -1,7 +1,8 @@
-// A source as its stanzas and statements, read with the compiler's reader
-// conventions, for the checker's diagnostics and warnings. The model keeps
-// views into the source text, which must outlive it: a statement is 24 bytes,
-// so that the model of a large source stays smaller than the source's compile.
+// The checker's view of the compiler's positioned source model: the stanzas
+// and statements that the compiler's reader yields, with the stanza type and
+// keyword row each one matched, kept as views into the source text, which
+// must outlive it. A statement is 24 bytes, so that the model of a large
+// source stays smaller than the source's compile.
 #ifndef QECFG_CHECK_SOURCE_MODEL_H
 #define QECFG_CHECK_SOURCE_MODEL_H
 
@@ -19,14 +20,16 @@ namespace check {
 struct statement {
     const char *at = nullptr;                 // the keyword's first character in the source text
     const lang::statement_row *row = nullptr; // null when the stanza has no such statement
-    int line = 0;
-    // Lengths and offsets within one piece of at most 254 characters.
+    int line : 31 = 0;                        // at most 2^30 - 1: a longer source would be gigabytes of blank lines
+    bool skipped : 1 = false;                 // the value is exactly "": the compiler ignores the statement
+    // Lengths and offsets from `at`, within one piece of at most 254 characters.
     std::uint8_t keyword_length = 0, value_offset = 0, value_length = 0;
-    bool skipped = false; // the value is exactly "": the compiler ignores the statement
+    std::uint8_t end_offset = 0; // where the statement's text ends, its comment cut off
 
     std::string_view keyword() const { return {at, keyword_length}; }
     std::string_view value() const { return {at + value_offset, value_length}; } // without its quotes
     std::string text() const { return std::string(value()); }
+    bool has_equals() const { return end_offset > keyword_length; }
 };
 static_assert(sizeof(statement) == 24, "a statement of the model stays compact");
 
@@ -39,6 +42,7 @@ struct stanza {
     const lang::stanza_type *type = nullptr; // null for a header that names no stanza type
     std::string_view header;
     std::span<const statement> statements;
+    zu_data_type_t data_type = ZU_UNKNOWN; // what its first DataType names; ZU_UNKNOWN for none
 
     bool is(int stanza_kind) const { return kind == stanza_kind; }
     bool is_attribute() const { return kind >= ST_PERSISTENT_RESOURCE_ATTRIBUTE && kind <= ST_DYNAMIC_CLASS_ATTRIBUTE; }
@@ -67,7 +71,9 @@ struct source_model {
     std::vector<std::vector<const stanza *>> classes() const;
 };
 
-// Reads `text`, which the model refers to and which must outlive it.
+// Reads `text` with the compiler's reader; the model refers to the text,
+// which must outlive it. Statements before the first header belong to no
+// stanza and are left out; reading ends where the compiler's does (a NUL).
 source_model read_model(std::string_view text);
 
 } // namespace check

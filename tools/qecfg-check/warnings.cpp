@@ -6,12 +6,11 @@
 #include <cstdlib>
 #include <map>
 #include <set>
+#include <unordered_map>
 
 #include "checks.h"
 
 namespace check {
-
-zu_data_type_t type_of(const stanza &s) { return lang::data_type_named(s.value_of(kw::DataType)); }
 
 std::uint32_t stored_identifier(const statement &st) {
     return std::uint32_t(std::strtol(st.text().c_str(), nullptr, 0));
@@ -37,7 +36,7 @@ std::string class_name(const std::vector<const stanza *> &cls, const std::string
 // The last Locator of a class is the one resolved when the class is
 // completed, against all its persistent resource attributes.
 void locator(const check_input &in, std::vector<explained> &out) {
-    for (const auto &cls : in.model.classes()) {
+    for (const auto &cls : in.classes) {
         std::vector<std::string> names;
         std::map<std::string, std::string> other_kinds;
         const statement *loc = nullptr;
@@ -69,7 +68,9 @@ namespace {
 // Reports the second of two stanzas of one group with the same key.
 template <typename Key> void report_repeats(const std::vector<std::pair<Key, const statement *>> &keyed,
                                             const std::string &what, std::vector<explained> &out) {
-    std::map<Key, const statement *> first;
+    if (keyed.size() < 2)
+        return;
+    std::unordered_map<Key, const statement *> first(keyed.size());
     for (const auto &[key, st] : keyed)
         if (auto [it, fresh] = first.emplace(key, st); !fresh)
             out.push_back(
@@ -98,27 +99,27 @@ bool in_group(const stanza &s, const std::vector<int> &group) {
 } // namespace
 
 void duplicate_id(const check_input &in, std::vector<explained> &out) {
-    for (const auto &cls : in.model.classes())
+    for (const auto &cls : in.classes)
         for (const auto &group : id_groups) {
             std::vector<std::pair<std::uint32_t, const statement *>> ids;
             for (const stanza *s : cls)
-                if (const statement *id = s->first(kw::Id); id && in_group(*s, group))
+                if (const statement *id = in_group(*s, group) ? s->first(kw::Id) : nullptr)
                     ids.emplace_back(stored_identifier(*id), id);
             report_repeats(ids, std::string(stanza_names[group[0]]) + " " + kw::Id, out);
         }
 }
 
 void duplicate_name(const check_input &in, std::vector<explained> &out) {
-    for (const auto &cls : in.model.classes())
+    for (const auto &cls : in.classes)
         for (const auto &group : name_groups) {
-            std::vector<std::pair<std::string, const statement *>> names;
+            std::vector<std::pair<std::string_view, const statement *>> names;
             for (const stanza *s : cls)
-                if (const statement *n = s->first(kw::Name); n && in_group(*s, group))
-                    names.emplace_back(n->text(), n);
+                if (const statement *n = in_group(*s, group) ? s->first(kw::Name) : nullptr)
+                    names.emplace_back(n->value(), n);
             report_repeats(names, "name", out);
         }
     // The elements of one structured-data definition: a run of one type.
-    std::vector<std::pair<std::string, const statement *>> elements;
+    std::vector<std::pair<std::string_view, const statement *>> elements;
     int run = NO_STANZA_TYPE;
     for (const stanza &s : in.model.stanzas) {
         if (s.kind != run) {
@@ -127,7 +128,7 @@ void duplicate_name(const check_input &in, std::vector<explained> &out) {
         }
         run = s.is_element() ? s.kind : NO_STANZA_TYPE;
         if (const statement *n = s.first(kw::ElementName); n && s.is_element())
-            elements.emplace_back(n->text(), n);
+            elements.emplace_back(n->value(), n);
     }
     report_repeats(elements, "element name", out);
 }
@@ -202,7 +203,7 @@ struct variable_ids {
 // that came from another class matches first, the reader's choice is not
 // what the source wrote.
 void variable_class_shared(const check_input &in, std::vector<explained> &out) {
-    std::vector<std::vector<const stanza *>> classes = in.model.classes();
+    const std::vector<std::vector<const stanza *>> &classes = in.classes;
     std::vector<variable_ids> tables;
     for (const stanza &s : in.model.stanzas)
         if (const statement *v = s.is(ST_RESOURCE_VARIABLE_CLASS) ? s.first(kw::VariableClass) : nullptr)
@@ -242,7 +243,7 @@ void variable_class_shared(const check_input &in, std::vector<explained> &out) {
 
 void unnamed_class(const check_input &in, std::vector<explained> &out) {
     std::string name = in.output_name.substr(0, in.output_name.find(".cdef"));
-    for (const auto &cls : in.model.classes())
+    for (const auto &cls : in.classes)
         if (std::none_of(cls.begin(), cls.end(),
                          [](const stanza *s) { return s->is(ST_RESOURCE_CLASS) && s->first(kw::Name); }))
             out.push_back({{cls.front()->line, std::string("the class has no ") + kw::Name +

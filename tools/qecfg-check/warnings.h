@@ -15,7 +15,8 @@ namespace check {
 // What a check sees: the source and what the compile was given.
 struct check_input {
     const source_model &model;
-    std::string output_name; // what an unnamed class is named after
+    std::string output_name;                          // what an unnamed class is named after
+    std::vector<std::vector<const stanza *>> classes; // of the model
 };
 
 using check_function = void (*)(const check_input &, std::vector<explained> &);

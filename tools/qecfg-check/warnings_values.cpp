@@ -121,11 +121,16 @@ void default_range(const check_input &in, std::vector<explained> &out) {
 
 namespace {
 
-bool plain_number(const std::string &text, long long lo, long long hi) {
+// Text of one piece at most, so it is converted in place of a copy.
+bool plain_number(std::string_view text, long long lo, long long hi) {
+    char copy[lang::READ_PIECE + 1];
+    text = text.substr(0, lang::READ_PIECE);
+    text.copy(copy, text.size());
+    copy[text.size()] = '\0';
     char *end = nullptr;
     errno = 0;
-    long long v = std::strtoll(text.c_str(), &end, 0);
-    return end != text.c_str() && *end == '\0' && errno == 0 && v >= lo && v <= hi;
+    long long v = std::strtoll(copy, &end, 0);
+    return end != copy && *end == '\0' && errno == 0 && v >= lo && v <= hi;
 }
 
 } // namespace
@@ -154,7 +159,7 @@ void number_text(const check_input &in, std::vector<explained> &out) {
         for (const statement &st : s.statements) {
             if (!st.row || st.skipped)
                 continue;
-            std::string value = st.text();
+            std::string_view value = st.value();
             bool fits = true;
             switch (st.row->kind) {
             case lang::value_kind::integer:
@@ -162,15 +167,16 @@ void number_text(const check_input &in, std::vector<explained> &out) {
             case lang::value_kind::identifier: fits = plain_number(value, INT32_MIN, UINT32_MAX); break;
             case lang::value_kind::variety: {
                 size_t comma = value.find(',');
-                fits = comma == std::string::npos || (plain_number(value.substr(0, comma), INT32_MIN, UINT32_MAX) &&
-                                                      plain_number(value.substr(comma + 1), INT32_MIN, UINT32_MAX));
+                fits =
+                    comma == std::string_view::npos || (plain_number(value.substr(0, comma), INT32_MIN, UINT32_MAX) &&
+                                                        plain_number(value.substr(comma + 1), INT32_MIN, UINT32_MAX));
                 break;
             }
             default: continue;
             }
             if (!fits)
                 out.push_back({{st.line, statement_text(st) + " is not a number that fits its field; it is stored as " +
-                                             stored_number(st.row->kind, value)},
+                                             stored_number(st.row->kind, st.text())},
                                {}});
         }
 }
@@ -222,6 +228,11 @@ void reversed_range(const check_input &in, std::vector<explained> &out) {
         for (const statement &st : s.statements) {
             if (!st.row || st.skipped)
                 continue;
+            // Both ends written alike convert alike: no conversion can reverse them.
+            std::string_view v = st.value();
+            size_t comma = v.find(',');
+            if (comma == std::string_view::npos || v.substr(0, comma) == v.substr(comma + 1))
+                continue;
             std::optional<value_range> r;
             if (st.row->kind == lang::value_kind::variety)
                 r = parse_range(ZU_INT64, st.text(), true);
@@ -234,8 +245,10 @@ void reversed_range(const check_input &in, std::vector<explained> &out) {
 
 void repeated_default(const check_input &in, std::vector<explained> &out) {
     for (const stanza &s : in.model.stanzas) {
+        if (!s.is_attribute())
+            continue;
         std::vector<const statement *> d = s.given(kw::DefaultValue);
-        if (s.is_attribute() && d.size() > 1 && !lang::is_array(type_of(s)))
+        if (d.size() > 1 && !lang::is_array(type_of(s)))
             out.push_back({{d[1]->line, "a second " + std::string(kw::DefaultValue) + " for the scalar type " +
                                             s.value_of(kw::DataType) + ": only the last one (" +
                                             on_line(d.back()->line) + ") is kept"},

@@ -4,10 +4,12 @@
 // one overrides.
 #include <algorithm>
 #include <cctype>
+#include <cstdlib>
 
 #include "cursor.h"
 #include "diagnose.h"
 #include "requests.h"
+#include "symbols.h"
 
 namespace lsp {
 
@@ -58,13 +60,46 @@ std::vector<std::string> stanza_names() {
     return v;
 }
 
+// The Id after the highest of the stanzas of the same kind in the class.
+std::string next_free_id(const check::source_model &m, const check::stanza &s) {
+    unsigned long next = 1;
+    for (const check::stanza *other : class_holding(m, s.line))
+        if (const check::statement *id = other->is(s.kind) ? other->first(kw::Id) : nullptr)
+            next = std::max(next, std::strtoul(id->text().c_str(), nullptr, 0) + 1);
+    return std::to_string(next);
+}
+
+// The index an element has: the elements of its definition before it.
+std::string element_position(const check::source_model &m, const check::stanza &s) {
+    size_t i = size_t(&s - m.stanzas.data()), before = 0;
+    while (i > 0 && m.stanzas[--i].is(s.kind))
+        before++;
+    return std::to_string(before);
+}
+
+// The value a missing statement is inserted with: one that compiles where
+// it is knowable, else TODO for the author to replace, which a text takes
+// as it is and any other value is refused with its own message.
+std::string placeholder(const document &d, const check::stanza &s, const lang::statement_row &r) {
+    using lang::value_kind;
+    switch (r.kind) {
+    case value_kind::integer:
+    case value_kind::display_name: return "0";
+    case value_kind::identifier: return next_free_id(d.model(), s);
+    case value_kind::element_index: return element_position(d.model(), s);
+    case value_kind::version: return "1.0.0.0";
+    case value_kind::variety: return "1,1";
+    default: return "TODO";
+    }
+}
+
 // The required statements a stanza lacks, inserted after its header in the
 // order of the keyword table.
 void missing_required(fix_context &fx, const check::stanza &s) {
     std::string text, names;
     for (const lang::statement_row &r : s.type->rows)
         if (!r.optional && !s.first(r.name)) {
-            text += "\t" + r.name + "=\n";
+            text += "\t" + r.name + "=" + placeholder(fx.d, s, r) + "\n";
             names += (names.empty() ? "" : ", ") + r.name;
         }
     if (text.empty())
@@ -78,7 +113,7 @@ void missing_required(fix_context &fx, const check::stanza &s) {
 
 // Several DefaultValue statements of a scalar type: all but the last go.
 void repeated_default(fix_context &fx, const check::stanza &s, zu_data_type_t type) {
-    std::vector<const check::statement *> defaults = s.given("DefaultValue");
+    std::vector<const check::statement *> defaults = s.given(kw::DefaultValue);
     if (defaults.size() < 2 || lang::is_array(type))
         return;
     json edits = json::array();
@@ -140,12 +175,10 @@ void stanza_fixes(fix_context &fx, const check::stanza &s, int first, int last) 
         return;
     }
     missing_required(fx, s);
-    const check::statement *type_stmt = s.first("DataType");
-    zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->text()) : ZU_UNKNOWN;
-    repeated_default(fx, s, type);
+    repeated_default(fx, s, s.data_type);
     for (const check::statement &st : s.statements)
         if (st.line >= first && st.line <= last && !st.skipped)
-            statement_fixes(fx, s, st, type);
+            statement_fixes(fx, s, st, s.data_type);
 }
 
 } // namespace
@@ -158,7 +191,7 @@ json code_actions(workspace &ws, const json &params) {
     fix_context fx{d, diagnostics.is_array() ? diagnostics : json::array()};
     int first = d.piece_at(range.from), last = d.piece_at(range.to);
     const check::source_model &m = d.model();
-    const check::stanza *from = stanza_holding(m, first);
+    const check::stanza *from = m.stanza_at(first);
     const check::stanza *begin = from ? from : m.stanzas.data(), *end = m.stanzas.data() + m.stanzas.size();
     for (const check::stanza *s = begin; s < end && s->line <= last; s++)
         stanza_fixes(fx, *s, first, last);

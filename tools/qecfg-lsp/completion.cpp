@@ -99,7 +99,7 @@ json value_words(const document &d, const cursor &c) {
         return words(letters, VALUE);
     }
     default:
-        if (row->name == "VariableClass" && c.stanza->is_dynamic())
+        if (row->name == kw::VariableClass && c.stanza->is_dynamic())
             return words(values_of(variable_class_definitions(d.model())), VALUE);
         return json::array();
     }

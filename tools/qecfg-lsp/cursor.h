@@ -23,15 +23,8 @@ struct cursor {
 
 cursor cursor_at(const document &d, position p);
 
-// The stanza holding a line: the last header at or before it.
-const check::stanza *stanza_holding(const check::source_model &m, int line);
-
 // The comma-separated word of a value around an offset, and its span.
 std::string word_at(const document &d, byte_span value, size_t offset, byte_span &word);
-
-// The span of a statement's value (or of its keyword) in the document.
-byte_span value_span(const document &d, const check::statement &s);
-byte_span keyword_span(const document &d, const check::statement &s);
 
 } // namespace lsp
 

@@ -1,4 +1,5 @@
-// Diagnostics come from the checker's own check of the text, so the server
+// Diagnostics come from the checker's own check of the text and of the
+// document's model (read once for every request after a change), so the server
 // and qecfg-check report the same error and warnings on the same lines.
 #include "diagnostics.h"
 
@@ -18,8 +19,8 @@ json related(const document &d, const std::vector<check::diagnostic> &notes) {
 } // namespace
 
 byte_span finding_span(const document &d, const check::diagnostic &where) {
-    if (where.line == 0) // the whole file: an empty range at its start
-        return {0, 0};
+    if (where.line == 0) // the whole file: shown on its first line
+        return {0, d.line(0).size()};
     piece_parts p = d.parts(where.line);
     if (p.whole.to == p.whole.from) // a line the reader ignores
         return p.piece;
@@ -31,7 +32,7 @@ byte_span finding_span(const document &d, const check::diagnostic &where) {
 }
 
 json diagnostics_of(const document &d, const check::check_options &opt) {
-    check::check_report report = check::check_text(path_of_uri(d.uri()), d.text(), opt);
+    check::check_report report = check::check_text(path_of_uri(d.uri()), d.text(), opt, d.model());
     json list = json::array();
     for (const check::finding &f : report.findings) {
         json diag = {{"range", range_json(d, finding_span(d, f.where))},
@@ -40,6 +41,8 @@ json diagnostics_of(const document &d, const check::check_options &opt) {
                      {"message", f.where.text}};
         if (!f.name.empty())
             diag["code"] = f.name;
+        if (f.where.line == 0) // no line of the source is at fault
+            diag["data"] = {{"wholeFile", true}};
         if (!f.notes.empty())
             diag["relatedInformation"] = related(d, f.notes);
         list.push_back(std::move(diag));

@@ -125,6 +125,20 @@ int document::piece_at(size_t offset) const {
     return piece_starts_.empty() ? 0 : int(std::max<size_t>(upper_index(piece_starts_, offset), 1));
 }
 
+byte_span document::span_of(std::string_view part) const {
+    size_t from = size_t(part.data() - text_.data());
+    return {from, from + part.size()};
+}
+
+byte_span document::keyword_span(const check::statement &s) const { return span_of(s.keyword()); }
+
+byte_span document::value_span(const check::statement &s) const {
+    size_t end = span_of(std::string_view(s.at, s.end_offset)).to;
+    return s.has_equals() ? byte_span{keyword_span(s).to + 1, end} : byte_span{end, end};
+}
+
+// What of the piece counts is what the compiler's reader made of it: a
+// header or a statement of the model; the rest is comment or blank.
 piece_parts document::parts(int piece) const {
     piece_parts p;
     p.piece = p.whole = p.keyword = p.value = {text_.size(), text_.size()};
@@ -134,20 +148,18 @@ piece_parts document::parts(int piece) const {
     size_t to = size_t(piece) < piece_starts_.size() ? piece_starts_[size_t(piece)] : text_.size();
     p.piece = {from, to > from && text_[to - 1] == '\n' ? to - 1 : to};
     p.whole = p.keyword = p.value = {from, from};
-    // The reader's own comment rules decide what of the piece counts.
-    char copy[lang::READ_PIECE + 2];
-    std::memcpy(copy, text_.data() + from, to - from);
-    copy[to - from] = '\0';
-    if (!lang::strip_line_comment(copy))
+    const check::source_model &m = model();
+    if (const check::stanza *s = m.stanza_at(piece); s && s->line == piece) {
+        p.header = true;
+        p.keyword = span_of(s->header);
+        p.value = {p.keyword.to, p.keyword.to};
+    } else if (const check::statement *st = m.statement_at(piece)) {
+        p.keyword = keyword_span(*st);
+        p.value = value_span(*st);
+    } else {
         return p;
-    size_t kept = std::strlen(copy);
-    p.whole = {from, from + kept};
-    p.header = copy[0] != ' ' && copy[0] != '\t';
-    size_t start = p.header ? 0 : std::strspn(copy, " \t");
-    const char *eq = p.header ? nullptr : static_cast<const char *>(std::memchr(copy + start, '=', kept - start));
-    size_t key_end = eq ? size_t(eq - copy) : kept;
-    p.keyword = {from + start, from + key_end};
-    p.value = eq ? byte_span{from + key_end + 1, from + kept} : byte_span{from + kept, from + kept};
+    }
+    p.whole = {from, std::max(p.keyword.to, p.value.to)};
     return p;
 }
 

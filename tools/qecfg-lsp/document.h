@@ -23,8 +23,9 @@ struct byte_span {
     size_t from = 0, to = 0;
 };
 
-// Where the parts of one piece lie: a header's name, or a statement's
-// keyword and value (empty when the piece holds neither).
+// Where the parts of one piece lie, as the compiler's reader found them: a
+// header's name, or a statement's keyword and value (empty when the piece
+// holds neither).
 struct piece_parts {
     byte_span piece;   // the piece without its line end; the end of the text past the last piece
     byte_span whole;   // the piece without its comment and line end
@@ -61,9 +62,14 @@ class document {
     int piece_count() const { return int(piece_starts_.size()); }
     int piece_at(size_t offset) const;
     piece_parts parts(int piece) const;
+    // Where a statement's keyword and its value after the '=' (quotes
+    // included) lie.
+    byte_span keyword_span(const check::statement &s) const;
+    byte_span value_span(const check::statement &s) const;
 
   private:
     void reindex();
+    byte_span span_of(std::string_view part) const; // of a view into the text
 
     std::string uri_;
     std::string text_;

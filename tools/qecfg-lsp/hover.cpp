@@ -57,7 +57,7 @@ std::string bounds_of(const check::stanza &s) {
 
 // How a value of the attribute's (or element's) data type is read.
 std::string typed_value(const check::stanza &s, const check::statement &st) {
-    const check::statement *type_stmt = s.first("DataType");
+    const check::statement *type_stmt = s.first(kw::DataType);
     zu_data_type_t type = type_stmt ? lang::data_type_named(type_stmt->text()) : ZU_UNKNOWN;
     if (type == ZU_UNKNOWN)
         return "The stanza gives no known DataType to read the value with.\n";

@@ -21,7 +21,7 @@ struct symbol {
 };
 
 // The text a stanza is named by, and where that name stands.
-const char *const NAMING_KEYWORDS[] = {"Name", "ElementName", "VariableClass", "ResourceManager"};
+const char *const NAMING_KEYWORDS[] = {kw::Name, kw::ElementName, kw::VariableClass, kw::ResourceManager};
 
 symbol stanza_symbol(const document &d, const check::stanza &s, symbol_kind kind) {
     piece_parts header = d.parts(s.line);
@@ -30,7 +30,7 @@ symbol stanza_symbol(const document &d, const check::stanza &s, symbol_kind kind
     for (const char *keyword : NAMING_KEYWORDS)
         if (const check::statement *st = s.first(keyword)) {
             sym.name = st->text();
-            sym.selection = value_span(d, *st);
+            sym.selection = d.value_span(*st);
             break;
         }
     return sym;
@@ -49,7 +49,7 @@ symbol class_symbol(const document &d, const std::vector<const check::stanza *> 
     for (const check::stanza *s : cls) {
         if (s->is(ST_RESOURCE_CLASS)) {
             symbol rc = stanza_symbol(d, *s, CLASS);
-            if (s->first("Name"))
+            if (s->first(kw::Name))
                 c.name = rc.name;
             extend(c, rc);
         } else if (s->is_attribute() || s->is_action()) {
@@ -135,13 +135,14 @@ bool thing_at(const document &d, const cursor &c, named_thing &thing) {
     if (!c.on_value || !c.statement || c.statement->skipped)
         return false;
     const check::stanza &s = *c.stanza;
-    std::string_view kw = c.statement->keyword(), value = c.statement->value();
-    if (kw == "VariableClass" && (s.is_dynamic() || s.is(ST_RESOURCE_VARIABLE_CLASS))) {
+    std::string_view keyword = c.statement->keyword(), value = c.statement->value();
+    if (keyword == kw::VariableClass && (s.is_dynamic() || s.is(ST_RESOURCE_VARIABLE_CLASS))) {
         thing = {matching(variable_class_definitions(d.model()), value),
                  matching(variable_class_uses(d.model()), value)};
         return true;
     }
-    if ((kw == "Locator" && s.is(ST_RESOURCE_CLASS)) || (kw == "Name" && s.is(ST_PERSISTENT_RESOURCE_ATTRIBUTE))) {
+    if ((keyword == kw::Locator && s.is(ST_RESOURCE_CLASS)) ||
+        (keyword == kw::Name && s.is(ST_PERSISTENT_RESOURCE_ATTRIBUTE))) {
         std::vector<const check::stanza *> cls = class_holding(d.model(), c.piece);
         thing = {matching(locator_targets(cls), value), matching(locator_uses(cls), value)};
         return true;
@@ -152,7 +153,7 @@ bool thing_at(const document &d, const cursor &c, named_thing &thing) {
 json locations(const document &d, const std::vector<const check::statement *> &statements) {
     json v = json::array();
     for (const check::statement *st : statements)
-        v.push_back(location_json(d, value_span(d, *st)));
+        v.push_back(location_json(d, d.value_span(*st)));
     return v;
 }
 

@@ -21,18 +21,18 @@ template <typename F> std::vector<const check::statement *> statements_where(con
 
 std::vector<const check::statement *> variable_class_definitions(const check::source_model &m) {
     return statements_where(m, [](const check::stanza &s, const check::statement &st) {
-        return s.is(ST_RESOURCE_VARIABLE_CLASS) && st.keyword() == "VariableClass";
+        return s.is(ST_RESOURCE_VARIABLE_CLASS) && st.keyword() == kw::VariableClass;
     });
 }
 
 std::vector<const check::statement *> variable_class_uses(const check::source_model &m) {
     return statements_where(m, [](const check::stanza &s, const check::statement &st) {
-        return s.is_dynamic() && st.keyword() == "VariableClass";
+        return s.is_dynamic() && st.keyword() == kw::VariableClass;
     });
 }
 
 std::vector<const check::stanza *> class_holding(const check::source_model &m, int line) {
-    const check::stanza *at = stanza_holding(m, line);
+    const check::stanza *at = m.stanza_at(line);
     std::vector<const check::stanza *> cls;
     if (!at)
         return cls;
@@ -62,11 +62,11 @@ std::vector<const check::statement *> class_statements(const std::vector<const c
 } // namespace
 
 std::vector<const check::statement *> locator_targets(const std::vector<const check::stanza *> &cls) {
-    return class_statements(cls, ST_PERSISTENT_RESOURCE_ATTRIBUTE, "Name");
+    return class_statements(cls, ST_PERSISTENT_RESOURCE_ATTRIBUTE, kw::Name);
 }
 
 std::vector<const check::statement *> locator_uses(const std::vector<const check::stanza *> &cls) {
-    return class_statements(cls, ST_RESOURCE_CLASS, "Locator");
+    return class_statements(cls, ST_RESOURCE_CLASS, kw::Locator);
 }
 
 } // namespace lsp
