@@ -101,9 +101,18 @@ TEST(LspFeatures, SettingsSwitchWarningsAndTheUnnamedClassRule) {
     std::string unnamed = replace_line(SOURCE, 9, "");
     session s(json{{"warnings", {{"unnamed-class", false}}}});
     EXPECT_TRUE(s.open(URI, unnamed).empty());
-    // An empty list is taken for an empty object: nothing changes.
+    // An empty list is taken for an empty object.
     s.notify("workspace/didChangeConfiguration", {{"settings", {{"warnings", json::array()}}}});
+    EXPECT_EQ(s.last_diagnostics(URI).size(), 1u);
+    // Each message is the whole of the settings: what it leaves out is back
+    // in its default state.
+    s.notify("workspace/didChangeConfiguration", {{"settings", {{"warnings", {{"unnamed-class", false}}}}}});
     EXPECT_TRUE(s.last_diagnostics(URI).empty());
+    s.notify("workspace/didChangeConfiguration", {{"settings", json::object()}});
+    EXPECT_EQ(s.last_diagnostics(URI).size(), 1u);
+    s.notify("workspace/didChangeConfiguration", {{"settings", json::array()}});
+    EXPECT_EQ(s.last_diagnostics(URI).size(), 1u);
+    s.notify("workspace/didChangeConfiguration", {{"settings", {{"warnings", {{"unnamed-class", false}}}}}});
     s.notify("workspace/didChangeConfiguration",
              {{"settings", {{"qecfg", {{"warnings", {{"unnamed-class", true}}}}}}}});
     json d = s.last_diagnostics(URI);
@@ -112,6 +121,7 @@ TEST(LspFeatures, SettingsSwitchWarningsAndTheUnnamedClassRule) {
     // Named after the document's file name, like the checker names it.
     EXPECT_NE(d[0]["message"].get<std::string>().find("'demo' for output 'demo.cdef'"), std::string::npos);
     s.notify("workspace/didChangeConfiguration", {{"settings", {{"outputName", "x/other.cdef"}}}});
+    ASSERT_EQ(s.last_diagnostics(URI).size(), 1u);
     EXPECT_NE(s.last_diagnostics(URI)[0]["message"].get<std::string>().find("'x/other'"), std::string::npos);
 }
 

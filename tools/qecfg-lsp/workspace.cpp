@@ -15,16 +15,19 @@ document &workspace::named(const json &params) {
 }
 
 void workspace::configure(const json &settings) {
-    // Clients that cannot tell an empty object from an empty list send [].
-    auto empty = [](const json &v) { return v.is_null() || (v.is_array() && v.empty()); };
-    if (empty(settings))
+    // Clients that cannot tell an empty object from an empty list send [];
+    // null is no settings at all.
+    if (settings.is_null())
         return;
-    if (!settings.is_object())
+    auto empty = [](const json &v) { return v.is_null() || (v.is_array() && v.empty()); };
+    if (!empty(settings) && !settings.is_object())
         throw rpc_error{INVALID_PARAMS, "settings must be an object"};
+    // Each message is the whole of the settings: a warning no longer named,
+    // or an output name left out, is back in its default state.
     const std::vector<check::warning_check> &checks = check::warning_checks();
-    std::vector<bool> enabled = check.enabled;
-    enabled.resize(checks.size(), true);
-    if (auto w = settings.find("warnings"); w != settings.end() && !empty(*w)) {
+    std::vector<bool> enabled = check::default_warnings();
+    std::string output_name;
+    if (auto w = settings.find("warnings"); settings.is_object() && w != settings.end() && !empty(*w)) {
         if (!w->is_object())
             throw rpc_error{INVALID_PARAMS, "'warnings' must be an object of booleans"};
         for (const auto &[name, on] : w->items()) {
@@ -36,9 +39,10 @@ void workspace::configure(const json &settings) {
             enabled[i] = on.get<bool>();
         }
     }
-    check.enabled = enabled;
-    if (auto o = settings.find("outputName"); o != settings.end())
-        check.output_name = o->is_string() ? o->get<std::string>() : "";
+    if (auto o = settings.find("outputName"); settings.is_object() && o != settings.end() && o->is_string())
+        output_name = o->get<std::string>();
+    check.enabled = std::move(enabled);
+    check.output_name = std::move(output_name);
 }
 
 } // namespace lsp
