@@ -8,7 +8,9 @@
 #include <vector>
 
 #include "qecfg_context.h"
+#include "qecfg_fatal.h"
 #include "qecfg_source.h"
+#include "qecfg_value.h"
 
 namespace {
 constexpr size_t PIECE_MAX = QECFG_PIECE_MAX;
