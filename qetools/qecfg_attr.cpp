@@ -21,21 +21,6 @@ const attr_kind attr_kinds[] = {
 
 const attr_kind &kind_of(int stanza) { return attr_kinds[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE]; }
 
-// Types whose range is none: their values are not ordered.
-bool is_unranged_type(zu_data_type_t dt) {
-    switch (dt) {
-    case ZU_SD_PTR:
-    case ZU_SD_PTR_ARRAY:
-    case ZU_CHAR_PTR:
-    case ZU_CHAR_PTR_ARRAY:
-    case ZU_BINARY_PTR:
-    case ZU_BINARY_PTR_ARRAY:
-    case ZU_RSRC_HANDLE_PTR:
-    case ZU_RSRC_HANDLE_PTR_ARRAY: return true;
-    default: return false;
-    }
-}
-
 void set_none(char *field) { store(field, none_ref()); }
 
 } // namespace
@@ -141,7 +126,7 @@ void attr_builder::store_data_type(char *target, const char *v) {
 
 void attr_builder::store_range(char *target, char *v) {
     zu_data_type_t dt = data_type();
-    if (is_unranged_type(dt))
+    if (zu_is_unordered_type(dt))
         return;
     range_given = true;
     if (!std::strchr(v, ','))
@@ -195,7 +180,7 @@ void attr_builder::complete() {
 // the type. A structured value is built when its run ends.
 void attr_builder::complete_value() {
     zu_data_type_t dt = data_type();
-    if (scalar_zu(dt) == ZU_SD_PTR)
+    if (zu_is_sd_type(dt))
         return;
     tbl *st = strings();
     if (uint32_t n = uint32_t(values.size())) {
@@ -212,44 +197,41 @@ void attr_builder::complete_value() {
         statement_error(dynamic_ ? msg::initial_value_not_built : msg::default_value_not_built);
 }
 
-// The range of a dynamic attribute: none for the reference types, the
-// default range when no Range statement was given.
+// The range of a dynamic attribute: none for an unordered scalar type, the
+// given one, or else the default range (for an array type, an array of one
+// default element at each end).
 void attr_builder::complete_range() {
     zu_data_type_t dt = data_type();
-    tbl *st = strings();
     value_slot lo = value_slot::at(&rec.d.ra_min_value), hi = value_slot::at(&rec.d.ra_max_value);
-    switch (dt) {
-    case ZU_SD_PTR:
-    case ZU_CHAR_PTR:
-    case ZU_BINARY_PTR:
-    case ZU_RSRC_HANDLE_PTR:
+    bool given = range_given;
+    range_given = false;
+    if (zu_is_unordered_type(dt) && !zu_is_array_type(dt)) {
         set_none(lo.addr());
         set_none(hi.addr());
-        break;
-    default:
-        if (range_given) {
-            // Plain numbers of the element type: the reversal must know.
-            if (zu_is_numeric_array(dt)) {
-                const tbl *table = class_table(kind_of(stanza).table);
-                numeric_ranges.insert({table, tbl_used(table)});
-            }
-            break;
-        }
-        if (dt == ZU_SD_PTR_ARRAY) {
-            body_cursor a[3];
-            if (copy_this_sd_type(arena, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                statement_error(msg::range_low_not_built);
-            body_cursor b[3];
-            if (copy_this_sd_type(arena, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                statement_error(msg::range_high_not_built);
-        } else {
-            body_cursor a;
-            if (copy_this_type(arena, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
-                statement_error(msg::range_low_not_built);
-            body_cursor b;
-            if (copy_this_type(arena, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
-                statement_error(msg::range_high_not_built);
-        }
+        return;
     }
-    range_given = false;
+    if (given) {
+        // Plain numbers of the element type: the reversal must know.
+        if (zu_is_numeric_array(dt)) {
+            const tbl *table = class_table(kind_of(stanza).table);
+            numeric_ranges.insert({table, tbl_used(table)});
+        }
+        return;
+    }
+    tbl *st = strings();
+    if (dt == ZU_SD_PTR_ARRAY) {
+        body_cursor a[3];
+        if (copy_this_sd_type(arena, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            statement_error(msg::range_low_not_built);
+        body_cursor b[3];
+        if (copy_this_sd_type(arena, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            statement_error(msg::range_high_not_built);
+        return;
+    }
+    body_cursor a;
+    if (copy_this_type(arena, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
+        statement_error(msg::range_low_not_built);
+    body_cursor b;
+    if (copy_this_type(arena, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
+        statement_error(msg::range_high_not_built);
 }

@@ -96,6 +96,28 @@ TEST(Builders, OneClassWithAttributesIsBuiltFromItsStatementsAlone) {
     EXPECT_EQ(ref_table(rc.u_rc_actions), nullptr);
 }
 
+// A Range is ignored for the unordered types, whatever its text, and refused
+// without its two ends for every other type.
+TEST(Builders, RangeOnlyForOrderedTypes) {
+    for (const char *type : {"String", "Binary", "RH", "SD", "StringArray", "BinaryArray", "RHArray", "SDArray",
+                             "Int32", "UInt64Array", "Float32"}) {
+        one_class c;
+        c.cls.start();
+        c.dattr.start();
+        const keyword_row &range = row_named(ST_DYNAMIC_RESOURCE_ATTRIBUTE, kw::Range);
+        give(c.dattr, ST_DYNAMIC_RESOURCE_ATTRIBUTE, kw::DataType, type);
+        std::string value = "7";
+        msg refusal = msg::none;
+        try {
+            c.dattr.store_statement(range, value.data());
+        } catch (const qecfg_fatal &f) {
+            refusal = f.id;
+        }
+        bool ordered = type[0] == 'I' || type[0] == 'U' || type[0] == 'F';
+        EXPECT_EQ(refusal, ordered ? msg::range_needs_two_values : msg::none) << type;
+    }
+}
+
 msg refusal_of(void (*build)(one_class &), uint64_t *line) {
     one_class c;
     try {
