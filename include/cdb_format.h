@@ -51,6 +51,11 @@ constexpr bool zu_is_numeric_array(uint32_t dt) { return dt >= ZU_INT32_ARRAY &&
 constexpr bool zu_is_sd_type(uint32_t dt) { return dt == ZU_SD_PTR || dt == ZU_SD_PTR_ARRAY; }
 // The element type of an array type; any other type is its own.
 constexpr uint32_t zu_element_type(uint32_t dt) { return zu_is_array_type(dt) ? dt - (ZU_INT32_ARRAY - ZU_INT32) : dt; }
+// Texts, binaries, resource handles and structured data (and arrays of them)
+// are not ordered: a Range for them is ignored, and they have no range.
+constexpr bool zu_is_unordered_type(uint32_t dt) {
+    return zu_element_type(dt) >= ZU_CHAR_PTR && zu_element_type(dt) <= ZU_SD_PTR;
+}
 
 // The source reader takes at most this many characters per read (a longer
 // line continues as the next line), and a value holds at most this many.

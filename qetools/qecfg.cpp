@@ -8,47 +8,21 @@
 #include "qecfg_sink.h"
 #include "qecfg_source.h"
 
-qecfg_context::~qecfg_context() {
-    if (source_fp)
-        std::fclose(source_fp);
-}
-
 void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects, int err) {
     int status = qecfg::message(id).status;
     throw qecfg_fatal{id, line, std::vector<std::string>(subjects.begin(), subjects.end()), status ? status : err};
 }
 
-qecfg_compiler::qecfg_compiler(qecfg_options opts) : qecfg_context(std::move(opts)) {}
-
-namespace {
-
-// The required-before-optional and duplicate rules. The given rows change
-// before the value is converted; a value then refused ends the compile.
-void apply_row_rules(qecfg_context &c, given_rows &given, int stanza, const keyword_row &row, const char *name) {
-    if (row.optional) {
-        if (given.required != stanza_defs[stanza].required_mask)
-            c.statement_error(msg::optional_before_required, {name});
-        if ((given.optional & row.bit) && !row.repeatable)
-            c.statement_error(msg::duplicate_statement, {name});
-        given.optional |= row.bit;
-        return;
-    }
-    if ((given.required & row.bit) && !row.repeatable)
-        c.statement_error(msg::duplicate_statement, {name});
-    given.required |= row.bit;
-    if (c.opt.trace_level > 1)
-        QECFG_TRACE(c, "Added %x to mask, which is now %x\n", row.bit, given.required);
-}
-
-} // namespace
+qecfg_compiler::qecfg_compiler(qecfg_options opts)
+    : opt(std::move(opts)), arena(table_trace{opt.trace_level, opt.trace_out, opt.trace_err}) {}
 
 void qecfg_compiler::read_source(const char *filename) {
-    source_fp = opt.source.in_memory ? open_memory_source(opt.source.text) : std::fopen(filename, "r");
+    source_fp.reset(opt.source.in_memory ? open_memory_source(opt.source.text) : std::fopen(filename, "r"));
     if (!source_fp) {
         int e = errno;
         raise_fatal(msg::cannot_open, 0, {filename, std::strerror(e)}, e);
     }
-    source_reader reader(source_fp, linenum);
+    source_reader reader(source_fp.get(), linenum);
     source_line line;
     while (reader.next(line)) {
         linenum = line.line;
@@ -63,8 +37,7 @@ void qecfg_compiler::read_source(const char *filename) {
         raise_fatal(stop.id, 0, {filename, std::strerror(stop.err)}, stop.err);
     if (stop.id != msg::none)
         raise_fatal(stop.id, stop.line);
-    std::fclose(source_fp);
-    source_fp = nullptr;
+    source_fp.reset();
 }
 
 stanza_builder &qecfg_compiler::builder_of(int t) {
@@ -133,14 +106,20 @@ void qecfg_compiler::read_statement(const source_line &s) {
     if (!s.row)
         statement_error(msg::unknown_keyword, {s.name, def.name});
     if (s.value_length == 0) {
-        QECFG_TRACE(*this, "In file %s: ", opt.source.name.c_str());
+        std::fprintf(opt.trace_out, "In file %s: ", opt.source.name.c_str());
         statement_error(msg::missing_value, {s.name});
     }
     if (opt.trace_level > 1)
-        QECFG_TRACE(*this, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, s.name, s.value,
-                    int(s.value_length));
+        std::fprintf(opt.trace_out, "%s: found attr: \"%s\", value: \"%s\",length: %d\n", def.name, s.name, s.value,
+                     int(s.value_length));
+    // The given rows change before the value is converted; a value then
+    // refused ends the compile.
     stanza_builder &b = builder_of(stanza);
-    apply_row_rules(*this, b.given, stanza, *s.row, s.name);
+    msg refusal = b.given.admit(*s.row, def.required_mask);
+    if (refusal != msg::none)
+        statement_error(refusal, {s.name});
+    if (!s.row->optional && opt.trace_level > 1)
+        std::fprintf(opt.trace_out, "Added %x to mask, which is now %x\n", s.row->bit, b.given.required);
     b.store_statement(*s.row, s.value);
     // A structured attribute owns the definition of the run that follows.
     if (s.row->what == statement::data_type) {
@@ -177,7 +156,7 @@ void qecfg_compiler::complete_open_attributes(std::initializer_list<int> order) 
 // header completes them.
 void qecfg_compiler::complete_class() {
     if (cls.rec.u_rc_name.offset[0] == CDB_NONE)
-        cls.name_from_output();
+        cls.name_from_output(opt.output_name);
     complete_open_attributes({ST_PERSISTENT_CLASS_ATTRIBUTE, ST_DYNAMIC_CLASS_ATTRIBUTE,
                               ST_PERSISTENT_RESOURCE_ATTRIBUTE, ST_DYNAMIC_RESOURCE_ATTRIBUTE});
     cls.finish();
@@ -189,16 +168,21 @@ void qecfg_compiler::build_manager() {
         raise_fatal(msg::no_manager, 0);
     rsrc_mgr_t m{};
     m.rm_cb_ID = RSRC_MGR_ID;
-    tbl *strings = new_tbl("ManagerStrings", 8192);
+    tbl *strings = arena.new_tbl("ManagerStrings", 8192);
     m.u_rm_strings_table = table_ref(strings);
-    m.u_rm_RMname.offset[0] = add_to_tbl(strings, map.manager.c_str(), map.manager.size() + 1);
+    m.u_rm_RMname.offset[0] = arena.add_to_tbl(strings, map.manager.c_str(), map.manager.size() + 1);
     m.rm_id = qel_rm_id_t(managers.count);
-    managers.append(*this, m);
+    managers.append(arena, m);
 }
 
 void qecfg_compiler::run() {
     try {
         compile();
+    } catch (qecfg_fatal &f) {
+        // A condition at the statement being read takes its line here.
+        if (f.line == 0 && qecfg::message(f.id).line == qecfg::line_source::statement)
+            f.line = linenum;
+        throw;
     } catch (const std::bad_alloc &) {
         // Memory taken by the library's containers runs out like a table's.
         raise_fatal(msg::out_of_memory, 0, {std::strerror(ENOMEM)}, ENOMEM);
@@ -217,7 +201,7 @@ void qecfg_compiler::compile() {
         raise_fatal(msg::no_maps, 0);
     map.complete();
     build_manager();
-    cdb_writer writer(*this, output_target(), opt.reverse_byte_order);
+    cdb_writer writer(arena, output_target(), opt.reverse_byte_order);
     writer.write(compiled_records{classes, maps, managers, var_classes, vclass.named, numeric_ranges});
 }
 

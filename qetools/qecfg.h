@@ -13,24 +13,23 @@
 #include <initializer_list>
 #include <memory>
 #include <set>
-#include <string>
-#include <unordered_map>
-#include <unordered_set>
-#include <vector>
 
 #include "qecfg_bld.h"
+#include "qecfg_context.h"
 
-class qecfg_compiler : public qecfg_context {
+// Closes the source when the compile ends, however it ends.
+struct source_closer {
+    void operator()(FILE *fp) const { std::fclose(fp); }
+};
+
+class qecfg_compiler {
   public:
     explicit qecfg_compiler(qecfg_options opts);
 
     // The compile: read the source, complete everything, build the CDB.
     void run();
 
-    record_table classes{"ResourceClasses", 3584};
-    record_table maps{"ResourceCMMaps", 480};
-    record_table managers{"ResourceManagers", 192};
-    record_table var_classes{"ResourceVariableClasses", 320};
+    uint64_t linenum = 0; // pieces of input read; more than 2^31 is possible
 
   private:
     void compile();
@@ -45,23 +44,30 @@ class qecfg_compiler : public qecfg_context {
     void complete_open_attributes(std::initializer_list<int> order);
     void complete_class();
     void build_manager();
+    image_target output_target() const;
 
+    qecfg_options opt;
+    table_arena arena;
+    std::unique_ptr<FILE, source_closer> source_fp; // open while the source is read
+
+    record_table classes{"ResourceClasses", 3584};
+    record_table maps{"ResourceCMMaps", 480};
+    record_table managers{"ResourceManagers", 192};
+    record_table var_classes{"ResourceVariableClasses", 320};
     // Dynamic attribute records of a numeric array type whose range holds
     // plain numbers, by table and offset.
     std::set<std::pair<const tbl *, size_t>> numeric_ranges;
 
-    class_builder cls{*this, classes};
-    map_builder map{*this, maps};
-    var_class_builder vclass{*this, var_classes};
-    attr_builder attrs[4]{{*this, cls, ST_PERSISTENT_RESOURCE_ATTRIBUTE, numeric_ranges},
-                          {*this, cls, ST_PERSISTENT_CLASS_ATTRIBUTE, numeric_ranges},
-                          {*this, cls, ST_DYNAMIC_RESOURCE_ATTRIBUTE, numeric_ranges},
-                          {*this, cls, ST_DYNAMIC_CLASS_ATTRIBUTE, numeric_ranges}};
-    action_builder actions[2]{{*this, cls, ST_CLASS_ACTION}, {*this, cls, ST_RESOURCE_ACTION}};
-    sd_run sd{*this, cls, actions};
+    class_builder cls{arena, classes};
+    map_builder map{arena, maps};
+    var_class_builder vclass{arena, var_classes};
+    attr_builder attrs[4]{{arena, opt.trace_out, cls, ST_PERSISTENT_RESOURCE_ATTRIBUTE, numeric_ranges},
+                          {arena, opt.trace_out, cls, ST_PERSISTENT_CLASS_ATTRIBUTE, numeric_ranges},
+                          {arena, opt.trace_out, cls, ST_DYNAMIC_RESOURCE_ATTRIBUTE, numeric_ranges},
+                          {arena, opt.trace_out, cls, ST_DYNAMIC_CLASS_ATTRIBUTE, numeric_ranges}};
+    action_builder actions[2]{{arena, cls, ST_CLASS_ACTION}, {arena, cls, ST_RESOURCE_ACTION}};
+    sd_run sd{arena, opt.trace_out, cls, actions};
     int stanza = -1, prev_stanza = -1; // of the last header and the one before
-
-    image_target output_target() const;
 };
 
 #endif

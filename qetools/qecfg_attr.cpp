@@ -21,28 +21,13 @@ const attr_kind attr_kinds[] = {
 
 const attr_kind &kind_of(int stanza) { return attr_kinds[stanza - ST_PERSISTENT_RESOURCE_ATTRIBUTE]; }
 
-// Types whose range is none: their values are not ordered.
-bool is_unranged_type(zu_data_type_t dt) {
-    switch (dt) {
-    case ZU_SD_PTR:
-    case ZU_SD_PTR_ARRAY:
-    case ZU_CHAR_PTR:
-    case ZU_CHAR_PTR_ARRAY:
-    case ZU_BINARY_PTR:
-    case ZU_BINARY_PTR_ARRAY:
-    case ZU_RSRC_HANDLE_PTR:
-    case ZU_RSRC_HANDLE_PTR_ARRAY: return true;
-    default: return false;
-    }
-}
-
 void set_none(char *field) { store(field, none_ref()); }
 
 } // namespace
 
-attr_builder::attr_builder(qecfg_context &c, class_builder &owner, int stanza,
+attr_builder::attr_builder(table_arena &arena, FILE *trace, class_builder &owner, int stanza,
                            std::set<std::pair<const tbl *, size_t>> &numeric_ranges)
-    : stanza_builder(c, &owner.rec), owner(owner), stanza(stanza),
+    : stanza_builder(arena, &owner.rec), trace(trace), owner(owner), stanza(stanza),
       dynamic_(stanza == ST_DYNAMIC_RESOURCE_ATTRIBUTE || stanza == ST_DYNAMIC_CLASS_ATTRIBUTE),
       numeric_ranges(numeric_ranges) {
     values.t.tbl_au = element_types.t.tbl_au = 32;
@@ -65,7 +50,7 @@ void attr_builder::start() {
     if (open())
         complete();
     if (!owner.open())
-        c.statement_error(kind_of(stanza).no_class);
+        statement_error(kind_of(stanza).no_class);
     if (dynamic_) {
         rec.d = rsrc_dattr_t{};
         rec.d.ra_cb_ID = kind_of(stanza).id;
@@ -98,7 +83,7 @@ void attr_builder::store_statement(const keyword_row &row, char *v) {
     case statement::variable_type: {
         qel_variable_type_t t = QEL_COUNTER;
         if (strToVar(v, &t) != 0)
-            c.statement_error(msg::invalid_variable_type);
+            statement_error(msg::invalid_variable_type);
         store<uint32_t>(target, t);
         break;
     }
@@ -120,11 +105,11 @@ void attr_builder::store_valid_value_statement(char *target, char *v) {
 void attr_builder::store_default(const char *v) {
     zu_data_type_t dt = data_type();
     if (zu_is_sd_type(dt))
-        c.statement_error(msg::default_for_structured);
-    char *slot = values.take(c);
+        statement_error(msg::default_for_structured);
+    char *slot = values.take(arena);
     zu_value_t val{};
-    if (str_to_zu(c, &val, dt, v) != 0)
-        c.statement_error(msg::invalid_data);
+    if (str_to_zu(arena, &val, dt, v) != 0)
+        statement_error(msg::invalid_data);
     store(slot, val);
 }
 
@@ -132,7 +117,7 @@ void attr_builder::store_data_type(char *target, const char *v) {
     zu_data_type_t dt = strToZuDt(v);
     store<uint32_t>(target, dt);
     if (dt == ZU_UNKNOWN)
-        c.statement_error(msg::invalid_data_type);
+        statement_error(msg::invalid_data_type);
     // A structured attribute collects the element types of the run that
     // must follow, in a list named after its type.
     if (zu_is_sd_type(dt))
@@ -141,15 +126,15 @@ void attr_builder::store_data_type(char *target, const char *v) {
 
 void attr_builder::store_range(char *target, char *v) {
     zu_data_type_t dt = data_type();
-    if (is_unranged_type(dt))
+    if (zu_is_unordered_type(dt))
         return;
     range_given = true;
     if (!std::strchr(v, ','))
-        c.statement_error(msg::range_needs_two_values);
+        statement_error(msg::range_needs_two_values);
     place_pair(dt, v, value_slot::at(target), value_slot::at(target + sizeof(zu_value_t)));
 }
 
-void attr_builder::add_element_type(zu_data_type_t type) { store(element_types.take(c), type); }
+void attr_builder::add_element_type(zu_data_type_t type) { store(element_types.take(arena), type); }
 
 // Each element gets the default of its type; an array-typed element an
 // array of its own.
@@ -159,19 +144,19 @@ void attr_builder::build_structured_value() {
     int code = dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT;
     for (uint32_t i = 0; i < n; i++) {
         array = body_cursor{};
-        if (copy_this_sd_type(c, value_field(), element_types.at(i), code, strings(), &array, &sd_array, &sd_element, n,
-                              data_type()) != 0)
-            c.statement_error(dynamic_ ? msg::structured_initial_not_built : msg::structured_default_not_built);
+        if (copy_this_sd_type(arena, value_field(), element_types.at(i), code, strings(), &array, &sd_array,
+                              &sd_element, n, data_type()) != 0)
+            statement_error(dynamic_ ? msg::structured_initial_not_built : msg::structured_default_not_built);
     }
 }
 
 void attr_builder::complete() {
     if (given.required != stanza_defs[stanza].required_mask) {
         if (stanza == ST_DYNAMIC_CLASS_ATTRIBUTE) {
-            QECFG_TRACE(c, "scp->req_mask:         %x\n", given.required);
-            QECFG_TRACE(c, "scp->req_mask_cmplt:   %x\n", stanza_defs[stanza].required_mask);
+            std::fprintf(trace, "scp->req_mask:         %x\n", given.required);
+            std::fprintf(trace, "scp->req_mask_cmplt:   %x\n", stanza_defs[stanza].required_mask);
         }
-        c.statement_error(msg::incomplete_stanza);
+        statement_error(msg::incomplete_stanza);
     }
     if (!valid_values_started)
         set_none(field(offsetof(rsrc_pattr_t, u_ra_valid_vals), offsetof(rsrc_dattr_t, u_ra_valid_vals)));
@@ -187,7 +172,7 @@ void attr_builder::complete() {
         rec.p.ra_props |= CDB_PA_INVAL_FOR_DEFINE;
     }
     size_t size = dynamic_ ? sizeof(rsrc_dattr_t) : sizeof(rsrc_pattr_t);
-    std::memcpy(c.alloc_tble(table, size), record(), size);
+    std::memcpy(arena.alloc_tble(table, size), record(), size);
     store<uint32_t>(record(), 0);
 }
 
@@ -195,61 +180,58 @@ void attr_builder::complete() {
 // the type. A structured value is built when its run ends.
 void attr_builder::complete_value() {
     zu_data_type_t dt = data_type();
-    if (scalar_zu(dt) == ZU_SD_PTR)
+    if (zu_is_sd_type(dt))
         return;
     tbl *st = strings();
     if (uint32_t n = uint32_t(values.size())) {
         body_cursor array;
         for (uint32_t i = 0; i < n; i++) {
             zu_value_t v = values.at(i);
-            if (copy_this_type(c, value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
-                c.statement_error(msg::default_not_placed);
+            if (copy_this_type(arena, value_field(), &v, dt, TYPE_SAME, st, &array, n) != 0)
+                statement_error(msg::default_not_placed);
         }
         return;
     }
     body_cursor a;
-    if (copy_this_type(c, value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
-        c.statement_error(dynamic_ ? msg::initial_value_not_built : msg::default_value_not_built);
+    if (copy_this_type(arena, value_field(), nullptr, dt, dynamic_ ? INIT_DEFAULT : DFLT_DEFAULT, st, &a, 1) != 0)
+        statement_error(dynamic_ ? msg::initial_value_not_built : msg::default_value_not_built);
 }
 
-// The range of a dynamic attribute: none for the reference types, the
-// default range when no Range statement was given.
+// The range of a dynamic attribute: none for an unordered scalar type, the
+// given one, or else the default range (for an array type, an array of one
+// default element at each end).
 void attr_builder::complete_range() {
     zu_data_type_t dt = data_type();
-    tbl *st = strings();
     value_slot lo = value_slot::at(&rec.d.ra_min_value), hi = value_slot::at(&rec.d.ra_max_value);
-    switch (dt) {
-    case ZU_SD_PTR:
-    case ZU_CHAR_PTR:
-    case ZU_BINARY_PTR:
-    case ZU_RSRC_HANDLE_PTR:
+    bool given = range_given;
+    range_given = false;
+    if (zu_is_unordered_type(dt) && !zu_is_array_type(dt)) {
         set_none(lo.addr());
         set_none(hi.addr());
-        break;
-    default:
-        if (range_given) {
-            // Plain numbers of the element type: the reversal must know.
-            if (zu_is_numeric_array(dt)) {
-                const tbl *table = class_table(kind_of(stanza).table);
-                numeric_ranges.insert({table, tbl_used(table)});
-            }
-            break;
-        }
-        if (dt == ZU_SD_PTR_ARRAY) {
-            body_cursor a[3];
-            if (copy_this_sd_type(c, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                c.statement_error(msg::range_low_not_built);
-            body_cursor b[3];
-            if (copy_this_sd_type(c, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
-                c.statement_error(msg::range_high_not_built);
-        } else {
-            body_cursor a;
-            if (copy_this_type(c, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
-                c.statement_error(msg::range_low_not_built);
-            body_cursor b;
-            if (copy_this_type(c, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
-                c.statement_error(msg::range_high_not_built);
-        }
+        return;
     }
-    range_given = false;
+    if (given) {
+        // Plain numbers of the element type: the reversal must know.
+        if (zu_is_numeric_array(dt)) {
+            const tbl *table = class_table(kind_of(stanza).table);
+            numeric_ranges.insert({table, tbl_used(table)});
+        }
+        return;
+    }
+    tbl *st = strings();
+    if (dt == ZU_SD_PTR_ARRAY) {
+        body_cursor a[3];
+        if (copy_this_sd_type(arena, lo, ZU_INT32, R_LO_DEFAULT, st, &a[0], &a[1], &a[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            statement_error(msg::range_low_not_built);
+        body_cursor b[3];
+        if (copy_this_sd_type(arena, hi, ZU_INT32, R_HI_DEFAULT, st, &b[0], &b[1], &b[2], 0, ZU_SD_PTR_ARRAY) != 0)
+            statement_error(msg::range_high_not_built);
+        return;
+    }
+    body_cursor a;
+    if (copy_this_type(arena, lo, nullptr, dt, R_LO_DEFAULT, st, &a, 1) != 0)
+        statement_error(msg::range_low_not_built);
+    body_cursor b;
+    if (copy_this_type(arena, hi, nullptr, dt, R_HI_DEFAULT, st, &b, 1) != 0)
+        statement_error(msg::range_high_not_built);
 }

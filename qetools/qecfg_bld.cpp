@@ -154,13 +154,8 @@ cdb_writer::~cdb_writer() {
         sink->abandon();
 }
 
-// The sink names its failure by the text its message begins with.
 [[noreturn]] void cdb_writer::output_failed(const sink_failure &f) {
-    msg id = msg::cannot_write;
-    for (msg m : {msg::cannot_create, msg::cannot_extend, msg::cannot_map, msg::cannot_write})
-        if (std::string(qecfg::message(m).text) == std::string(f.prefix) + "%s")
-            id = m;
-    raise_fatal(id, 0, {f.text ? f.text : std::strerror(f.err)});
+    raise_fatal(f.id, 0, {f.reason.empty() ? std::string_view(std::strerror(f.err)) : std::string_view(f.reason)});
 }
 
 char *cdb_writer::acquire_image(size_t cdb_file_size) {

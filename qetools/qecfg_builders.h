@@ -1,15 +1,22 @@
 // Stanza builders: each record kind is built by a builder that owns its
 // record while it is open, the rows its stanza has had, its default list and
 // its structured-data link. A builder is started by the header of its stanza
-// and completed in one place; the reader hands it the statements.
+// and completed in one place; the compile sequence hands it the statements.
+// A builder needs no compile: only the table arena its records and values go
+// to (and, for the two that trace, where traces go). Its fatal conditions
+// name no line; the sequence, which reads the lines, gives them theirs.
 #ifndef QECFG_BUILDERS_H
 #define QECFG_BUILDERS_H
 
+#include <cstdio>
 #include <set>
+#include <string>
 #include <vector>
 
-#include "qecfg_context.h"
+#include "qecfg_fatal.h"
 #include "qecfg_keywords.h"
+#include "qecfg_tbl.h"
+#include "qecfg_value.h"
 
 // The records of the whole source, one table per kind.
 struct record_table {
@@ -25,7 +32,7 @@ struct record_table {
 // The statements of the stanza being read go to the open builder of its kind.
 class stanza_builder {
   public:
-    explicit stanza_builder(qecfg_context &c, const rsrc_class_t *cls = nullptr) : c(c), cls(cls) {}
+    explicit stanza_builder(table_arena &arena, const rsrc_class_t *cls = nullptr) : arena(arena), cls(cls) {}
     virtual ~stanza_builder() = default;
     stanza_builder(const stanza_builder &) = delete;
     stanza_builder &operator=(const stanza_builder &) = delete;
@@ -46,7 +53,7 @@ class stanza_builder {
     // Converts "low,high" (or one value for both) and places both ends.
     void place_pair(zu_data_type_t dt, char *value, value_slot low, value_slot high);
 
-    qecfg_context &c;
+    table_arena &arena;
     const rsrc_class_t *cls; // the class whose tables hold the sections
     // The display message id of the valid value stored last, by table and
     // offset; none at the start of every attribute, action and element.
@@ -64,17 +71,17 @@ template <typename T> struct slot_list {
     size_t size() const { return tbl_used(&t) / SLOT; }
     T at(size_t i) const { return load<T>(t.tbl_base + i * SLOT); }
     // The next slot, zero-filled; valid until the next one is taken.
-    char *take(qecfg_context &c) { return static_cast<char *>(c.alloc_tble(&t, SLOT)); }
+    char *take(table_arena &arena) { return static_cast<char *>(arena.alloc_tble(&t, SLOT)); }
 };
 
 class class_builder : public stanza_builder {
   public:
-    class_builder(qecfg_context &c, record_table &classes) : stanza_builder(c, &rec), classes(classes) {}
+    class_builder(table_arena &arena, record_table &classes) : stanza_builder(arena, &rec), classes(classes) {}
     rsrc_class_t rec{};
     bool open() const { return rec.rc_cb_ID != 0; }
-    void start();            // a fresh class with its thirteen tables
-    void name_from_output(); // an unnamed class takes the output's name
-    void finish();           // the locator resolved, the record appended
+    void start();                                          // a fresh class with its thirteen tables
+    void name_from_output(const std::string &output_name); // of an unnamed class
+    void finish();                                         // the locator resolved, the record appended
     uint32_t new_section(cdb_ref_t rsrc_class_t::*table, size_t size, uint32_t id);
     void store_statement(const keyword_row &row, char *value) override;
 
@@ -89,7 +96,7 @@ class class_builder : public stanza_builder {
 
 class map_builder : public stanza_builder {
   public:
-    map_builder(qecfg_context &c, record_table &maps) : stanza_builder(c), maps(maps) {}
+    map_builder(table_arena &arena, record_table &maps) : stanza_builder(arena), maps(maps) {}
     rsrc_cmmap_t rec{};
     bool open() const { return rec.rcm_cb_ID != 0; }
     void start();
@@ -106,7 +113,8 @@ class map_builder : public stanza_builder {
 
 class var_class_builder : public stanza_builder {
   public:
-    var_class_builder(qecfg_context &c, record_table &var_classes) : stanza_builder(c), var_classes(var_classes) {}
+    var_class_builder(table_arena &arena, record_table &var_classes)
+        : stanza_builder(arena), var_classes(var_classes) {}
     rsrc_variable_class_t rec{};
     bool open() const { return rec.rvc_cb_ID != 0; }
     void start();
@@ -123,7 +131,7 @@ class var_class_builder : public stanza_builder {
 
 class attr_builder : public stanza_builder {
   public:
-    attr_builder(qecfg_context &c, class_builder &owner, int stanza,
+    attr_builder(table_arena &arena, FILE *trace, class_builder &owner, int stanza,
                  std::set<std::pair<const tbl *, size_t>> &numeric_ranges);
     bool open() const { return load<uint32_t>(&rec) != 0; }
     void start();
@@ -151,6 +159,7 @@ class attr_builder : public stanza_builder {
     void complete_range();
     void complete_value();
 
+    FILE *trace;
     class_builder &owner;
     const int stanza;
     const bool dynamic_;
@@ -166,7 +175,7 @@ class attr_builder : public stanza_builder {
 
 class action_builder : public stanza_builder {
   public:
-    action_builder(qecfg_context &c, class_builder &owner, int stanza);
+    action_builder(table_arena &arena, class_builder &owner, int stanza);
     rsrc_action_t rec{};
     bool open() const { return rec.ac_cb_ID != 0; }
     void start();
@@ -183,7 +192,7 @@ class action_builder : public stanza_builder {
 // in "ClassSDDefs", one element per stanza, attached to its owner.
 class sd_run : public stanza_builder {
   public:
-    sd_run(qecfg_context &c, class_builder &owner, action_builder (&actions)[2]);
+    sd_run(table_arena &arena, FILE *trace, class_builder &owner, action_builder (&actions)[2]);
     bool pending() const { return element_open; } // an element is being read
     void start_stanza(int kind, int prev_stanza);
     void complete(); // the run ends
@@ -201,6 +210,7 @@ class sd_run : public stanza_builder {
     void store_element_index(const char *value);
     void store_element_type(const char *value);
 
+    FILE *trace;
     class_builder &owner;
     action_builder (&actions)[2];
     attr_builder *attr = nullptr; // the structured attribute the run belongs to

@@ -37,7 +37,7 @@ void class_builder::start() {
     rec.u_rc_name = rec.u_rc_alias = rec.u_rc_def_input = rec.u_rc_undef_input = none_ref();
     rec.u_rc_online_input = rec.u_rc_offline_input = rec.u_rc_reset_input = none_ref();
     for (const class_table_def &d : class_tables)
-        rec.*d.field = table_ref(c.new_tbl(d.name, d.au));
+        rec.*d.field = table_ref(arena.new_tbl(d.name, d.au));
 }
 
 void class_builder::store_statement(const keyword_row &row, char *v) {
@@ -49,19 +49,19 @@ void class_builder::store_statement(const keyword_row &row, char *v) {
 }
 
 // An unnamed class takes the output file name up to its first ".cdef".
-void class_builder::name_from_output() {
-    size_t pos = c.opt.output_name.find(".cdef");
+void class_builder::name_from_output(const std::string &output_name) {
+    size_t pos = output_name.find(".cdef");
     if (pos == std::string::npos)
         raise_fatal(msg::unnamed_class_output, 0);
-    std::string name = c.opt.output_name.substr(0, pos);
-    rec.u_rc_name.offset[0] = c.add_to_tbl(strings(), name.c_str(), name.size() + 1);
+    std::string name = output_name.substr(0, pos);
+    rec.u_rc_name.offset[0] = arena.add_to_tbl(strings(), name.c_str(), name.size() + 1);
 }
 
 void class_builder::finish() {
     resolve_locator();
     for (const class_table_def &d : class_tables)
-        c.release_if_empty(rec.*d.field);
-    classes.append(c, rec);
+        arena.release_if_empty(rec.*d.field);
+    classes.append(arena, rec);
     rec.rc_cb_ID = 0;
 }
 
@@ -90,7 +90,7 @@ void class_builder::resolve_locator() {
 // count, and returns its offset.
 uint32_t class_builder::new_section(cdb_ref_t rsrc_class_t::*table, size_t size, uint32_t id) {
     tbl *t = ref_table(rec.*table);
-    char *p = static_cast<char *>(c.alloc_tble(t, size));
+    char *p = static_cast<char *>(arena.alloc_tble(t, size));
     store<uint32_t>(p, id);
     store<uint32_t>(p + 4, 0);
     return uint32_t(p - t->tbl_base);
@@ -101,7 +101,7 @@ void map_builder::start() {
         raise_fatal(msg::second_map, 0);
     rec = rsrc_cmmap_t{};
     rec.rcm_cb_ID = RSRC_CMMAP_ID;
-    rec.u_rcm_strings = table_ref(c.new_tbl("CMMapStrings", STRINGS_AU));
+    rec.u_rcm_strings = table_ref(arena.new_tbl("CMMapStrings", STRINGS_AU));
 }
 
 void map_builder::store_statement(const keyword_row &row, char *v) {
@@ -115,8 +115,8 @@ void map_builder::store_statement(const keyword_row &row, char *v) {
 
 void map_builder::complete() {
     if (rec.rcm_first_key > rec.rcm_last_key)
-        c.statement_error(msg::first_key_above_last);
-    maps.append(c, rec);
+        statement_error(msg::first_key_above_last);
+    maps.append(arena, rec);
     rec.rcm_cb_ID = 0;
 }
 
@@ -126,7 +126,7 @@ void var_class_builder::start() {
     rec = rsrc_variable_class_t{};
     rec.rvc_cb_ID = RSRC_VARIABLE_CLASS_ID;
     rec.u_rvc_compat_name = none_ref();
-    rec.u_rvc_string_tbl = table_ref(c.new_tbl("VarClassStrings", STRINGS_AU));
+    rec.u_rvc_string_tbl = table_ref(arena.new_tbl("VarClassStrings", STRINGS_AU));
     name_given = false;
 }
 
@@ -137,7 +137,7 @@ void var_class_builder::store_statement(const keyword_row &row, char *v) {
 }
 
 void var_class_builder::complete() {
-    var_classes.append(c, rec);
+    var_classes.append(arena, rec);
     named.push_back(name_given);
     rec.rvc_cb_ID = 0;
 }

@@ -30,4 +30,11 @@ struct qecfg_fatal {
 [[noreturn]] void raise_fatal(msg id, uint64_t line, std::initializer_list<std::string_view> subjects = {},
                               int err = 0);
 
+// A fatal condition at the statement being read. Whoever raises it need not
+// know the line: the compile sequence, which reads the lines, gives it to
+// every condition of a row whose line is the statement's.
+[[noreturn]] inline void statement_error(msg id, std::initializer_list<std::string_view> subjects = {}) {
+    raise_fatal(id, 0, subjects);
+}
+
 #endif

@@ -5,6 +5,7 @@
 
 #include <cstdint>
 
+#include "qecfg/messages.h"
 #include "qecfg_language.h"
 
 // The kind of a structured-data stanza: whose input, response or value its
@@ -82,6 +83,18 @@ inline bool is_attr_sd_stanza(int t) {
 struct given_rows {
     uint32_t required = 0, optional = 0;
     bool has(const keyword_row &r) const { return ((r.optional ? optional : required) & r.bit) == r.bit; }
+
+    // The required-before-optional and duplicate rules: a row of a stanza
+    // whose required rows are `required_mask` is counted as given, or its
+    // refusal is returned (optional_before_required, duplicate_statement).
+    qecfg::message_id admit(const keyword_row &r, uint32_t required_mask) {
+        if (r.optional && required != required_mask)
+            return qecfg::message_id::optional_before_required;
+        if (has(r) && !r.repeatable)
+            return qecfg::message_id::duplicate_statement;
+        (r.optional ? optional : required) |= r.bit;
+        return qecfg::message_id::none;
+    }
 };
 
 // The row of a stanza type with this keyword.

@@ -11,6 +11,9 @@ using enum message_id;
 constexpr int SYSTEM = 0; // the status is the system's error number
 constexpr line_source LINE = line_source::statement;
 constexpr line_source NO_LINE = line_source::none;
+constexpr const char *COMPILED_IN =
+    "The stanza types are data compiled into the compiler, so the table of every kind is "
+    "always found.";
 
 constexpr message_row rows[] = {
     {none, "none", "", 0, NO_LINE},
@@ -21,7 +24,8 @@ constexpr message_row rows[] = {
     {statement_before_stanza, "statement-before-stanza", "Attribute found but no table defined yet", 1, LINE},
     {missing_equals, "missing-equals", "Missing '=' after attribute name", 1, LINE},
     {unmatched_quotes, "unmatched-quotes", "Unmatched double quotes for attribute: %s", 1, LINE},
-    {value_too_long, "value-too-long", "Attibute value exceeds maximum length: %s", 1, LINE},
+    {value_too_long, "value-too-long", "Attibute value exceeds maximum length: %s", 1, LINE,
+     "A line is read in pieces of at most 254 characters, so no value reaches the limit of 1797."},
     {unknown_keyword, "unknown-keyword", "Attribute name not defined in table (name/table): %s%s", 1, LINE},
     {missing_value, "missing-value", "Missing attribute value: %s", 1, LINE},
     {optional_before_required, "optional-before-required",
@@ -90,6 +94,18 @@ constexpr message_row rows[] = {
     {cannot_extend, "cannot-extend", "Cannot extend CDB file: %s", 1, NO_LINE},
     {cannot_map, "cannot-map", "Cannot map CDB file: %s", 1, NO_LINE},
     {cannot_write, "cannot-write", "Cannot write CDB file: %s", 1, NO_LINE},
+    {pattr_table_missing, "pattr-table-missing", "PersistentResourceAttribute table not found", 1, LINE, COMPILED_IN},
+    {pclass_attr_table_missing, "pclass-attr-table-missing", "PersistentClassAttribute table not found", 1, LINE,
+     COMPILED_IN},
+    {dattr_table_missing, "dattr-table-missing", "DynamicResourceAttribute table not found", 1, LINE, COMPILED_IN},
+    {dclass_attr_table_missing, "dclass-attr-table-missing", "DynamicClassAttribute table not found", 1, LINE,
+     COMPILED_IN},
+    {class_action_table_missing, "class-action-table-missing", "Class Action table not found", 1, LINE, COMPILED_IN},
+    {resource_action_table_missing, "resource-action-table-missing", "Resource Action table not found", 1, LINE,
+     COMPILED_IN},
+    {no_class_sd_table, "no-class-sd-table", "No Class SD table for SD Definition", 1, LINE,
+     "A class creates its structured-data table when it starts, and a structured-data stanza without a class is "
+     "refused first (`No class for SD Definition`)."},
 };
 
 constexpr bool rows_in_order() {
@@ -99,7 +115,7 @@ constexpr bool rows_in_order() {
     return true;
 }
 static_assert(rows_in_order(), "a message row out of the order of message_id");
-static_assert(size_t(cannot_write) + 1 == std::size(rows), "a message without its row");
+static_assert(size_t(no_class_sd_table) + 1 == std::size(rows), "a message without its row");
 
 } // namespace
 

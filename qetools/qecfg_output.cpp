@@ -37,13 +37,13 @@
 
 namespace {
 
-const char CREATE[] = "Cannot create CDB file: ";
-const char EXTEND[] = "Cannot extend CDB file: ";
-const char MAP[] = "Cannot map CDB file: ";
-const char WRITE[] = "Cannot write CDB file: ";
+constexpr qecfg::message_id CREATE = qecfg::message_id::cannot_create;
+constexpr qecfg::message_id EXTEND = qecfg::message_id::cannot_extend;
+constexpr qecfg::message_id MAP = qecfg::message_id::cannot_map;
+constexpr qecfg::message_id WRITE = qecfg::message_id::cannot_write;
 
-[[noreturn]] void fail(const char *prefix, int err, const char *text = nullptr) {
-    throw sink_failure{prefix, err, text};
+[[noreturn]] void fail(qecfg::message_id id, int err, std::string reason = {}) {
+    throw sink_failure{id, err, std::move(reason)};
 }
 
 // ---------------------------------------------------------------------------
@@ -226,7 +226,7 @@ class file_sink final : public image_sink {
     void extend(size_t size);
     void publish();
     void name_temporary();
-    void close_file(const char *prefix);
+    void close_file(qecfg::message_id failure);
     void drop_temporary_name() noexcept;
 
     std::string name_; // as given
@@ -246,12 +246,10 @@ class file_sink final : public image_sink {
     void *map_ = nullptr;
     size_t mapped_ = 0;
     bool regular_ = false;
-    std::string reason_; // the text of a refusal
 };
 
 [[noreturn]] void file_sink::refuse(int err, const std::string &reason) {
-    reason_ = std::string(std::strerror(err)) + ": " + reason;
-    fail(CREATE, err, reason_.c_str());
+    fail(CREATE, err, std::string(std::strerror(err)) + ": " + reason);
 }
 
 // Opens the directory part of path (relative to `at`) as dir_.
@@ -442,7 +440,7 @@ void file_sink::extend(size_t size) {
     if (fstat(fd_, &st) != 0)
         fail(MAP, errno);
     if (st.st_size < off_t(size))
-        fail(regular_ ? EXTEND : MAP, EINVAL, regular_ ? "File shorter than its reserved size" : nullptr);
+        fail(regular_ ? EXTEND : MAP, EINVAL, regular_ ? "File shorter than its reserved size" : "");
     mapped_ = size_t(st.st_size);
 }
 
@@ -481,11 +479,11 @@ void file_sink::name_temporary() {
     fail(WRITE, EEXIST);
 }
 
-void file_sink::close_file(const char *prefix) {
+void file_sink::close_file(qecfg::message_id failure) {
     int fd = fd_;
     fd_ = -1;
     if (close(fd) != 0)
-        fail(prefix, errno);
+        fail(failure, errno);
 }
 
 // The image reached the disk before its name does (flush_), so that a crash

@@ -8,11 +8,16 @@
 #include <vector>
 
 #include "qecfg_context.h"
+#include "qecfg_fatal.h"
 #include "qecfg_source.h"
+#include "qecfg_value.h"
 
 namespace {
 constexpr size_t PIECE_MAX = QECFG_PIECE_MAX;
 constexpr size_t LINE_BUFFER = PIECE_MAX + 2;
+// No value can be too long (value_too_long is never raised) while a piece is
+// shorter than the longest value.
+static_assert(PIECE_MAX < QECFG_MAX_VALUE_LEN);
 } // namespace
 
 // Hands out the pieces that fgets with a 255-byte size would return, each
@@ -258,10 +263,6 @@ void source_reader::read_statement(char *piece, source_line &out) const {
     out.value = value;
     out.value_column = column(piece, value);
     out.value_length = uint32_t(std::strlen(value));
-    if (out.value_length > QECFG_MAX_VALUE_LEN) {
-        out.problem = msg::value_too_long;
-        return;
-    }
     if (stanza_ >= 0)
         out.row = find_row(stanza_, name, out.name_length);
 }

@@ -19,8 +19,8 @@ uint32_t element_required_rows() {
 
 } // namespace
 
-sd_run::sd_run(qecfg_context &c, class_builder &owner, action_builder (&actions)[2])
-    : stanza_builder(c, &owner.rec), owner(owner), actions(actions) {}
+sd_run::sd_run(table_arena &arena, FILE *trace, class_builder &owner, action_builder (&actions)[2])
+    : stanza_builder(arena, &owner.rec), trace(trace), owner(owner), actions(actions) {}
 
 // The owner field of a class or action kind: an action run belongs to the
 // open ClassAction, else to the ResourceAction.
@@ -45,7 +45,7 @@ void sd_run::start_stanza(int k, int prev_stanza) {
     // Without a class there is no structured attribute either: an attribute
     // run is refused for its missing owner, as after a ResourceClass.
     if (!owner.open())
-        c.statement_error(attr_kind ? msg::attribute_sd_without_attribute : msg::no_class_for_sd);
+        statement_error(attr_kind ? msg::attribute_sd_without_attribute : msg::no_class_for_sd);
     bool completed = false;
     if (element_open && prev_stanza != k) {
         complete();
@@ -65,23 +65,23 @@ void sd_run::start_stanza(int k, int prev_stanza) {
 void sd_run::check_new_definition(int k) {
     sd_type_t sk = stanza_defs[k].sd_kind;
     if ((sk == SD_TYPE_ACT_IN || sk == SD_TYPE_ACT_RESP) && !actions[0].open() && !actions[1].open())
-        c.statement_error(msg::no_action_for_sd);
+        statement_error(msg::no_action_for_sd);
     bool attr_has_definition = attr && load<uint32_t>(&attr->sd_ref()) != CDB_NONE;
     if (is_attr_sd_stanza(k)) {
         if (attr_has_definition)
-            c.statement_error(msg::one_sd_per_attribute);
+            statement_error(msg::one_sd_per_attribute);
         return;
     }
     if (attr && !attr_has_definition)
-        c.statement_error(msg::attribute_sd_expected);
+        statement_error(msg::attribute_sd_expected);
     if (load<uint32_t>(class_owner(k)) != CDB_NONE)
-        c.statement_error(msg::one_sd_per_kind);
+        statement_error(msg::one_sd_per_kind);
 }
 
 void sd_run::begin_definition(int k) {
     bool attr_kind = is_attr_sd_stanza(k);
     if (attr_kind && !attr)
-        c.statement_error(msg::attribute_sd_without_attribute);
+        statement_error(msg::attribute_sd_without_attribute);
     cdb_ref_t *ref = attr_kind ? &attr->sd_ref() : class_owner(k);
     def_off = owner.new_section(&rsrc_class_t::u_rc_sd_defs, sizeof(sd_def_t), SD_DEF_ID);
     store<uint32_t>(ref, def_off);
@@ -101,12 +101,12 @@ void sd_run::next_element() {
 void sd_run::append_pending_element() {
     uint32_t required = element_required_rows();
     if ((given.required & required) != required)
-        c.statement_error(msg::incomplete_stanza);
+        statement_error(msg::incomplete_stanza);
     tbl *sdt = class_table(&rsrc_class_t::u_rc_sd_defs);
     uint32_t count = load<uint32_t>(sdt->tbl_base + def_off + offsetof(sd_def_t, sd_count));
     uint32_t field = def_off + offsetof(sd_def_t, sd_fields);
     if (count != 0)
-        field = uint32_t(static_cast<char *>(c.alloc_tble(sdt, sizeof(sd_field))) - sdt->tbl_base);
+        field = uint32_t(static_cast<char *>(arena.alloc_tble(sdt, sizeof(sd_field))) - sdt->tbl_base);
     sd_field el = element;
     el.sd_action_id = CDB_SD_ELEMENT_ACTION_ID;
     el.sd_valid_type = CDB_SD_ELEMENT_VALID_TYPE;
@@ -143,19 +143,19 @@ void sd_run::store_statement(const keyword_row &row, char *v) {
         }
         store_valid_value(element.u_sd_valid_vals.offset[0], zu_data_type_t(element.sd_field_type), v);
         break;
-    case statement::element_default_value: c.statement_error(msg::element_default_refused);
+    case statement::element_default_value: statement_error(msg::element_default_refused);
     default: stanza_builder::store_statement(row, v); break;
     }
 }
 
 void sd_run::store_element_index(const char *v) {
     zu_value_t val{};
-    if (str_to_zu(c, &val, ZU_UINT32, v) != 0)
-        c.statement_error(msg::invalid_data);
+    if (str_to_zu(arena, &val, ZU_UINT32, v) != 0)
+        statement_error(msg::invalid_data);
     curr_sdeli = int(val.val_uint32);
     if (curr_sdeli != expected_sdeli) {
-        QECFG_TRACE(c, "curr_sdel = %d, expected_sdeli = %d\n", curr_sdeli, expected_sdeli);
-        c.statement_error(msg::element_index_order);
+        std::fprintf(trace, "curr_sdel = %d, expected_sdeli = %d\n", curr_sdeli, expected_sdeli);
+        statement_error(msg::element_index_order);
     }
     expected_sdeli = int(unsigned(curr_sdeli) + 1);
 }
@@ -163,7 +163,7 @@ void sd_run::store_element_index(const char *v) {
 void sd_run::store_element_type(const char *v) {
     zu_data_type_t type = strToZuDt(v);
     if (zu_is_sd_type(type))
-        c.statement_error(msg::structured_element_type);
+        statement_error(msg::structured_element_type);
     element.sd_field_type = type;
     if (attr)
         attr->add_element_type(type);

@@ -11,12 +11,15 @@
 #include <sys/types.h>
 #include <vector>
 
-// A failure of the output: the message prefix (one of the builder's
-// "Cannot ... CDB file: " texts) and the system error number or text.
+#include "qecfg/messages.h"
+
+// A failure of the output: the message it ends the compile with
+// (cannot_create, cannot_extend, cannot_map or cannot_write), the system's
+// error number, and the reason where it is not that number's text.
 struct sink_failure {
-    const char *prefix;
+    qecfg::message_id id;
     int err;
-    const char *text = nullptr; // replaces strerror(err) when set
+    std::string reason; // replaces strerror(err) when not empty
 };
 
 class image_sink {

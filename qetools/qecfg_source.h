@@ -39,7 +39,7 @@ struct source_line {
     bool skipped = false;             // the value is exactly "": nothing is stored
     const keyword_row *row = nullptr; // null when the stanza type has no such keyword
     // What is wrong with a statement as read: statement_before_stanza,
-    // missing_equals, unmatched_quotes, value_too_long, or none.
+    // missing_equals, unmatched_quotes, or none.
     qecfg::message_id problem = qecfg::message_id::none;
 };
 

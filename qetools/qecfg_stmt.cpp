@@ -23,11 +23,11 @@ long stmt_int(const char *v) {
 // The first entry of a list goes into the room of its header; later ones are
 // appended directly behind, since nothing else is appended to the table
 // while one stanza is read.
-uint32_t next_list_entry(qecfg_context &c, tbl *t, uint32_t sec, size_t entry_size) {
+uint32_t next_list_entry(table_arena &arena, tbl *t, uint32_t sec, size_t entry_size) {
     uint32_t count = load<uint32_t>(t->tbl_base + sec + 4);
     if (count == 0)
         return sec + 8;
-    char *p = static_cast<char *>(c.alloc_tble(t, entry_size));
+    char *p = static_cast<char *>(arena.alloc_tble(t, entry_size));
     return uint32_t(p - t->tbl_base);
 }
 
@@ -47,8 +47,8 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
     case statement::text: {
         tbl *st = strings();
         if (!st)
-            c.statement_error(msg::no_strings_table);
-        store<uint32_t>(target, c.add_to_tbl(st, v, std::strlen(v) + 1));
+            statement_error(msg::no_strings_table);
+        store<uint32_t>(target, arena.add_to_tbl(st, v, std::strlen(v) + 1));
         break;
     }
     case statement::class_properties:
@@ -76,7 +76,7 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
     case statement::variety_range: store_variety(target, v); break;
     case statement::value_display_name:
         if (!vvdisp_tbl)
-            c.statement_error(msg::no_valid_value_for_display_name);
+            statement_error(msg::no_valid_value_for_display_name);
         store<uint16_t>(vvdisp_tbl->tbl_base + vvdisp_off, uint16_t(stmt_int(v)));
         break;
     case statement::permission:
@@ -95,14 +95,14 @@ void stanza_builder::store_statement(const keyword_row &row, char *v) {
 void stanza_builder::store_variety(char *field, char *v) {
     char *comma = std::strchr(v, ',');
     if (!comma)
-        c.statement_error(msg::variety_format);
+        statement_error(msg::variety_format);
     *comma = '\0';
     tbl *vt = class_table(&rsrc_class_t::u_rc_variety_lists);
     uint32_t sec = load<uint32_t>(field);
-    uint32_t entry = next_list_entry(c, vt, sec, sizeof(vl_entry));
+    uint32_t entry = next_list_entry(arena, vt, sec, sizeof(vl_entry));
     const char *high = comma + 1;
     if (std::strchr(high, ','))
-        c.statement_error(msg::too_many_varieties);
+        statement_error(msg::too_many_varieties);
     store<uint32_t>(vt->tbl_base + entry + offsetof(vl_entry, vl_high_val), uint32_t(stmt_int(high)));
     store<uint32_t>(vt->tbl_base + entry + offsetof(vl_entry, vl_low_val), uint32_t(stmt_int(v)));
     count_entry(vt, sec + offsetof(variety_list_t, vl_count));
@@ -110,7 +110,7 @@ void stanza_builder::store_variety(char *field, char *v) {
 
 void stanza_builder::store_valid_value(uint32_t sec, zu_data_type_t dt, char *v) {
     tbl *vvt = class_table(&rsrc_class_t::u_rc_valid_vals);
-    uint32_t entry = next_list_entry(c, vvt, sec, sizeof(vv_entry));
+    uint32_t entry = next_list_entry(arena, vvt, sec, sizeof(vv_entry));
     value_slot low = value_slot::in(vvt, entry + offsetof(vv_entry, vv_low_val));
     value_slot high = value_slot::in(vvt, entry + offsetof(vv_entry, vv_high_val));
     place_pair(dt, v, low, high);
@@ -128,18 +128,19 @@ void stanza_builder::place_pair(zu_data_type_t dt, char *v, value_slot low, valu
     char *comma = std::strchr(v, ',');
     if (comma) {
         *comma = '\0';
-        if (str_to_zu(c, &val, dt, comma + 1) != 0)
-            c.statement_error(msg::invalid_data);
-        if (copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-            c.statement_error(msg::value_not_placed);
+        if (str_to_zu(arena, &val, dt, comma + 1) != 0)
+            statement_error(msg::invalid_data);
+        if (copy_this_type(arena, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+            statement_error(msg::value_not_placed);
         val = zu_value_t{};
-        if (str_to_zu(c, &val, dt, v) != 0 || copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-            c.statement_error(msg::invalid_data);
+        if (str_to_zu(arena, &val, dt, v) != 0 ||
+            copy_this_type(arena, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+            statement_error(msg::invalid_data);
         return;
     }
-    if (str_to_zu(c, &val, dt, v) != 0)
-        c.statement_error(msg::invalid_data);
-    if (copy_this_type(c, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
-        copy_this_type(c, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
-        c.statement_error(msg::value_not_placed);
+    if (str_to_zu(arena, &val, dt, v) != 0)
+        statement_error(msg::invalid_data);
+    if (copy_this_type(arena, low, &val, stype, TYPE_SAME, st, nullptr, 0) != 0 ||
+        copy_this_type(arena, high, &val, stype, TYPE_SAME, st, nullptr, 0) != 0)
+        statement_error(msg::value_not_placed);
 }

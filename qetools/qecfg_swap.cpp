@@ -166,8 +166,7 @@ void walk_sd_def(const swap_image &img, size_t ref_pos, const swap_bases &b) {
 // structured-data attribute without a definition holds 0 there, which
 // designates no body.
 zu_data_type_t own_value_type(const swap_image &img, size_t sd_ref_pos, zu_data_type_t type) {
-    const bool sd = type == ZU_SD_PTR || type == ZU_SD_PTR_ARRAY;
-    return sd && ref_offset(img, sd_ref_pos) == CDB_NONE ? ZU_NONE : type;
+    return zu_is_sd_type(type) && ref_offset(img, sd_ref_pos) == CDB_NONE ? ZU_NONE : type;
 }
 
 // The type by which a dynamic attribute's range is walked. A Range statement

@@ -5,7 +5,7 @@
 #include <cstdlib>
 #include <new>
 
-#include "qecfg_context.h"
+#include "qecfg_fatal.h"
 #include "qecfg_tbl.h"
 
 namespace {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "qecfg_context.h"
+#include "qecfg_fatal.h"
 #include "qecfg_source.h"
 
 namespace {

@@ -82,24 +82,35 @@ TEST(Writer, ReversedImageIsInTheOtherByteOrder) {
 // A sink that fails at commit, and must then be told to give up the image.
 class failing_sink final : public image_sink {
   public:
+    explicit failing_sink(sink_failure failure) : failure(std::move(failure)) {}
     char *acquire(size_t size) override { return (bytes = std::vector<char>(size)).data(); }
-    void commit(size_t) override { throw sink_failure{"Cannot write CDB file: ", ENOSPC}; }
+    void commit(size_t) override { throw failure; }
     void abandon() noexcept override { abandoned = true; }
+    sink_failure failure;
     std::vector<char> bytes;
     bool abandoned = false;
 };
 
+// The failure's row and reason (or else its error number's text) make the
+// message.
 TEST(Writer, FailedCommitIsFatalAndAbandonsTheImage) {
-    hand_made_records r;
-    failing_sink sink;
-    try {
-        cdb_writer(r.arena, image_target{&sink, "", {}}, false).write(r.records());
-        ADD_FAILURE() << "the commit failure was lost";
-    } catch (const qecfg_fatal &f) {
-        EXPECT_EQ(f.id, msg::cannot_write);
-        EXPECT_EQ(f.text(false), std::string("Cannot write CDB file: ") + std::strerror(ENOSPC));
+    const std::pair<sink_failure, std::string> cases[] = {
+        {{msg::cannot_write, ENOSPC, ""}, std::string("Cannot write CDB file: ") + std::strerror(ENOSPC)},
+        {{msg::cannot_extend, EINVAL, "File shorter than its reserved size"},
+         "Cannot extend CDB file: File shorter than its reserved size"},
+    };
+    for (const auto &[failure, message] : cases) {
+        hand_made_records r;
+        failing_sink sink(failure);
+        try {
+            cdb_writer(r.arena, image_target{&sink, "", {}}, false).write(r.records());
+            ADD_FAILURE() << "the commit failure was lost";
+        } catch (const qecfg_fatal &f) {
+            EXPECT_EQ(f.id, failure.id);
+            EXPECT_EQ(f.text(false), message);
+        }
+        EXPECT_TRUE(sink.abandoned);
     }
-    EXPECT_TRUE(sink.abandoned);
 }
 
 } // namespace

@@ -90,6 +90,14 @@ enum class message_id : std::uint16_t {
     cannot_extend,
     cannot_map,
     cannot_write,
+    // texts of the language that this build never raises (message_row::unraised)
+    pattr_table_missing,
+    pclass_attr_table_missing,
+    dattr_table_missing,
+    dclass_attr_table_missing,
+    class_action_table_missing,
+    resource_action_table_missing,
+    no_class_sd_table,
 };
 
 // Where the line printed before a message comes from.
@@ -104,6 +112,9 @@ struct message_row {
     const char *text; // exact; each "%s" is replaced by the next subject
     int status;       // the exit status; 0: the system's error number
     line_source line;
+    // Why this build never raises the message, for a text that the language
+    // has but no source can reach here; null for every message it raises.
+    const char *unraised = nullptr;
 };
 
 // Every row, in the order of message_id, without the row of `none`.

@@ -10,7 +10,8 @@
 namespace docgen {
 
 // The generated blocks of the reference, by block name ("stanza NAME",
-// "properties", "permissions", "variable-types", "data-types").
+// "properties", "permissions", "variable-types", "data-types",
+// "unraised-messages").
 std::map<std::string, std::string> reference_blocks();
 
 // Replaces the body of every generated block of a Markdown text. Blocks are

@@ -5,6 +5,7 @@
 
 #include "docgen.h"
 #include "lang.h"
+#include "qecfg/messages.h"
 
 namespace docgen {
 
@@ -72,6 +73,42 @@ std::string word_list(const std::vector<std::string> &words) {
     return s + "\n";
 }
 
+// A message text as the reference writes it: its fixed parts quoted, each
+// subject as NAME.
+std::string message_pattern(const std::string &text) {
+    std::string out;
+    for (size_t from = 0;;) {
+        size_t to = text.find("%s", from);
+        std::string part = text.substr(from, to == std::string::npos ? std::string::npos : to - from);
+        if (!part.empty())
+            out += (out.empty() ? "`" : " `") + part + "`";
+        if (to == std::string::npos)
+            return out;
+        out += " NAME";
+        from = to + 2;
+    }
+}
+
+// The messages that the language has and this build never raises, one row
+// per reason, from the table of messages: the reference cannot give them a
+// cause.
+std::string unraised_messages() {
+    std::vector<std::pair<std::string, std::string>> rows; // reason, messages
+    for (const qecfg::message_row &m : qecfg::messages()) {
+        if (!m.unraised)
+            continue;
+        if (rows.empty() || rows.back().first != m.unraised)
+            rows.emplace_back(m.unraised, "");
+        std::string &messages = rows.back().second;
+        messages += (messages.empty() ? "" : ", ") + message_pattern(m.text);
+    }
+    std::ostringstream o;
+    o << "| Message | Why this build never raises it |\n|---|---|\n";
+    for (const auto &[reason, messages] : rows)
+        o << "| " << messages << " | " << reason << " |\n";
+    return o.str();
+}
+
 } // namespace
 
 std::map<std::string, std::string> reference_blocks() {
@@ -85,6 +122,7 @@ std::map<std::string, std::string> reference_blocks() {
     b["permissions"] = word_list(letters);
     b["variable-types"] = word_list(lang::variable_type_names());
     b["data-types"] = word_list(lang::data_type_names());
+    b["unraised-messages"] = unraised_messages();
     return b;
 }
 
