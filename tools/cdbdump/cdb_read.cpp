@@ -1,7 +1,5 @@
 #include "cdb_read.h"
 
-#include <qecfg/cdb_reader.h>
-
 #include <algorithm>
 #include <vector>
 
@@ -266,19 +264,20 @@ class model_reader {
 
 } // namespace
 
-bool library_accepts(const uint8_t *data, size_t size) {
-    cdb_t db;
+bool open_checked(const uint8_t *data, size_t size, cdb_t &db) {
     if (cdb_open(&db, data, size) != CDB_OK)
         return false;
     std::vector<unsigned char> scratch(cdb_check_scratch_size(&db));
     return cdb_check(&db, scratch.data(), scratch.size(), nullptr) == CDB_OK;
 }
 
-bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+bool library_accepts(const uint8_t *data, size_t size) {
     cdb_t db;
-    if (!library_accepts(data, size))
-        return false;
-    cdb_open(&db, data, size);
+    return open_checked(data, size, db);
+}
+
+cdb_file read_head(const cdb_t &db) {
+    cdb_file head;
     cdb_header_t h;
     cdb_get_header(&db, &h);
     head.big_endian = db.big_endian != 0;
@@ -293,12 +292,22 @@ bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_
     cdb_dsect_t d;
     for (uint32_t i = 0; cdb_dsect_at(&db, i, &d) == CDB_OK; i++)
         head.anchors.push_back(anchor{d.type, d.offset, d.length, d.revision});
-    model_reader reader(db);
+    return head;
+}
+
+dsect read_dsect(const cdb_t &db, uint32_t i, const cdb_dsect_t &d) { return model_reader(db).read(i, d); }
+
+bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+    cdb_t db;
+    if (!open_checked(data, size, db))
+        return false;
+    head = read_head(db);
+    cdb_dsect_t d;
     for (uint32_t i = 0; cdb_dsect_at(&db, i, &d) == CDB_OK; i++) {
         if (each)
-            each(i, reader.read(i, d));
+            each(i, read_dsect(db, i, d));
         else
-            head.dsects.push_back(reader.read(i, d));
+            head.dsects.push_back(read_dsect(db, i, d));
     }
     return true;
 }

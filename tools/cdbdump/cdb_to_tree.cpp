@@ -3,6 +3,7 @@
 #include <type_traits>
 
 #include "cdb_names.h"
+#include "cdb_print.h"
 #include "cdb_text.h"
 #include "cdb_walk.h"
 
@@ -240,8 +241,15 @@ node dsect_node(const dsect &d, const anchor &a) {
 
 namespace {
 void add_members(tree_writer &w, const node &object) {
-    for (const auto &m : object.members())
-        w.member(m.first, m.second);
+    flat_doc d;
+    to_flat(object, d);
+    w.members(d, 0);
+}
+
+void add_item(tree_writer &w, const node &n) {
+    flat_doc d;
+    to_flat(n, d);
+    w.item(d, 0);
 }
 
 const char *const record_size_names[NUM_RECORD_SIZES] = {
@@ -311,7 +319,7 @@ void begin_file(tree_writer &w, const cdb_file &f) {
 void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
     const auto *c = std::get_if<class_dsect>(&d);
     if (!c) {
-        w.item(dsect_node(d, a));
+        add_item(w, dsect_node(d, a));
         return;
     }
     w.begin_object();
@@ -320,7 +328,7 @@ void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
     class_lists(*c, [&](const char *key, const auto &items, auto render) {
         w.begin_array(key, items.size());
         for (const auto &x : items)
-            w.item(render(x));
+            add_item(w, render(x));
         w.end();
     });
     w.end();
@@ -333,6 +341,8 @@ void end_file(tree_writer &w) {
 } // namespace
 
 void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out) {
+    if (print_checked(data, size, style, out))
+        return;
     tree_writer w(style, out);
     begin_file(w, head);
     verify_each(data, size, [&](size_t i, dsect &&d) { write_dsect(w, d, head.anchors[i]); });

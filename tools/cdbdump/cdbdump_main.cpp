@@ -13,6 +13,7 @@
 #include "cdb_diff.h"
 #include "cdb_header.h"
 #include "cdb_input.h"
+#include "cdb_print.h"
 #include "cdb_read.h"
 #include "cdb_sink.h"
 #include "cdb_source.h"
@@ -88,6 +89,11 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
             return 0;
         }
         if (m == mode::check && library_accepts(in.data(), in.size()))
+            return 0;
+        // One full check; only a file the library refuses is walked.
+        if ((m == mode::text || m == mode::json) &&
+            print_checked(in.data(), in.size(), m == mode::json ? tree_writer::style::json : tree_writer::style::text,
+                          out))
             return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
         if (m == mode::header) {
