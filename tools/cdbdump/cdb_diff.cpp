@@ -4,6 +4,7 @@
 #include <map>
 #include <set>
 
+#include "cdb_dsects.h"
 #include "cdb_names.h"
 #include "cdb_text.h"
 #include "cdb_to_tree.h"
@@ -154,73 +155,103 @@ std::string dsect_key(const node &d, node &part) {
 }
 
 // A file's dsects under their keys (dsect_key, made unique); each dsect is
-// made into its tree only when it is compared, so that the trees of one pair
-// are held at a time.
+// read and made into its tree only when it is compared, so that the trees of
+// one pair are held at a time.
 struct keyed_dsects {
-    const cdb_file &f;
+    const dsect_source &f;
     std::vector<std::string> keys;
 
-    keyed_dsects(const cdb_file &file, part_map &parts) : f(file) {
+    keyed_dsects(const dsect_source &file, part_map &parts) : f(file) {
         std::vector<node> given;
-        for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) {
+        for (size_t i = 0; i < f.count(); i++) {
             node part = node::null(),
-                 key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
-            if (auto *c = std::get_if<class_dsect>(&f.dsects[i]))
-                key.add("name", node::string(c->name));
-            if (auto *v = std::get_if<var_class_dsect>(&f.dsects[i]))
-                key.add("name", v->name ? node::string(*v->name) : node::null())
-                    .add("alias", v->alias ? node::string(*v->alias) : node::null());
+                 key = node::object().add("dsect", node::token(dsect_kind_name(f.head().anchors[i].type)));
+            auto opt = [](const std::optional<std::string> &s) { return s ? node::string(*s) : node::null(); };
+            dsect_source::names names = f.names_of(i);
+            if (f.head().anchors[i].type == CDB_DSECT_CLASS)
+                key.add("name", opt(names.name));
+            if (f.head().anchors[i].type == CDB_DSECT_VAR_CLASS)
+                key.add("name", opt(names.name)).add("alias", opt(names.alias));
             keys.push_back(dsect_key(key, part));
             given.push_back(std::move(part));
         }
         keys = unique(keys, given, parts);
     }
-    // The dsect's content: its tree without its kind, which the key holds.
-    node body(size_t i) const {
-        node b = dsect_node(f.dsects[i], f.anchors[i]);
-        b.erase("dsect");
-        return b;
-    }
+    node body(size_t i) const { return dsect_body(f, i); }
     // The header without its timestamp.
     node header() const {
-        node h = *file_head(f).find("header");
+        node h = *file_head(f.head()).find("header");
         h.erase("timestamp");
         return h;
     }
 };
 
 // The two files compared as objects of the header and one member per dsect
-// (as differ::objects compares objects), one pair of dsects at a time.
-void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b) {
+// (as differ::objects compares objects), one pair of dsects at a time; the
+// changes of the header and of each dsect go to `each` as one batch. A dsect
+// removed or added whole is only referred to.
+template <typename F> void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b, F flush) {
     d.compare(a.header(), b.header(), {"header"}, "header");
+    flush();
     std::map<std::string, size_t> in_b;
     for (size_t i = 0; i < b.keys.size(); i++)
         in_b.emplace(b.keys[i], i);
     std::set<std::string> in_a(a.keys.begin(), a.keys.end());
     for (size_t i = 0; i < a.keys.size(); i++) {
         auto found = in_b.find(a.keys[i]);
-        if (found != in_b.end())
+        if (found != in_b.end()) {
             d.compare(a.body(i), b.body(found->second), {a.keys[i]}, a.keys[i]);
-        else
-            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, a.body(i), node::null(), false, ""});
+        } else {
+            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, node::null(), node::null(), false, ""});
+            d.changes.back().whole = {&a.f, i};
+        }
+        flush();
     }
-    for (size_t i = 0; i < b.keys.size(); i++)
-        if (!in_a.count(b.keys[i]))
-            d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), b.body(i), false, ""});
+    for (size_t i = 0; i < b.keys.size(); i++) {
+        if (in_a.count(b.keys[i]))
+            continue;
+        d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), node::null(), false, ""});
+        d.changes.back().whole = {&b.f, i};
+        flush();
+    }
 }
 } // namespace
 
+node dsect_body(const dsect_source &f, size_t i) {
+    node b = dsect_node(f.read(i), f.head().anchors[i]);
+    b.erase("dsect");
+    return b;
+}
+
 std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file) {
+    return diff(*model_source(old_file), *model_source(new_file));
+}
+
+void diff_each(const dsect_source &old_file, const dsect_source &new_file, const change_consumer &each) {
     differ d;
-    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts));
-    // The first segment names a dsect (or is the header), a quoted one an item;
-    // any other is a member's key.
-    for (change &c : d.changes)
-        for (size_t i = 0; i < c.path.size(); i++) {
-            auto part = i == 0 || c.path[i][0] == '"' ? d.parts.find(c.path[i]) : d.parts.end();
-            c.parts.push_back(part == d.parts.end() ? node::string(c.path[i]) : part->second);
-        }
-    return d.changes;
+    auto flush = [&] {
+        if (d.changes.empty())
+            return;
+        // The first segment names a dsect (or is the header), a quoted one an
+        // item; any other is a member's key.
+        for (change &c : d.changes)
+            for (size_t i = 0; i < c.path.size(); i++) {
+                auto part = i == 0 || c.path[i][0] == '"' ? d.parts.find(c.path[i]) : d.parts.end();
+                c.parts.push_back(part == d.parts.end() ? node::string(c.path[i]) : part->second);
+            }
+        each(std::move(d.changes));
+        d.changes.clear();
+    };
+    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts), flush);
+}
+
+std::vector<change> diff(const dsect_source &old_file, const dsect_source &new_file) {
+    std::vector<change> all;
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+        for (change &c : batch)
+            all.push_back(std::move(c));
+    });
+    return all;
 }
 
 namespace {
@@ -378,7 +409,10 @@ node change_node(const change &c, bool compat) {
     for (const node &part : c.parts)
         path.push(part);
     node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
-    n.add("old", c.before).add("new", c.after);
+    // A dsect removed or added whole is read again from its file.
+    bool removed = c.what == change::kind::removed;
+    n.add("old", c.whole.file && removed ? dsect_body(*c.whole.file, c.whole.index) : c.before);
+    n.add("new", c.whole.file && !removed ? dsect_body(*c.whole.file, c.whole.index) : c.after);
     if (compat)
         n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
     return n;
@@ -398,22 +432,43 @@ void judge(std::vector<change> &changes) {
     }
 }
 
-void write_changes(text_sink &out, const std::vector<change> &changes, bool json, bool compat) {
+int report_changes(const dsect_source &old_file, const dsect_source &new_file, bool json, bool compat, text_sink &out) {
+    size_t count = 0;
+    bool breaks = false;
+    auto judged = [&](std::vector<change> &batch) {
+        if (compat)
+            judge(batch);
+        count += batch.size();
+        breaks = breaks || std::any_of(batch.begin(), batch.end(), [](const change &c) { return c.breaking; });
+    };
     if (!json) {
-        for (const change &c : changes)
-            out << change_line(c, compat);
-        return;
+        diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+            judged(batch);
+            for (const change &c : batch)
+                out << change_line(c, compat);
+        });
+        return (compat ? breaks : count > 0) ? 1 : 0;
     }
-    bool breaks = std::any_of(changes.begin(), changes.end(), [](const change &c) { return c.breaking; });
-    node list = node::array();
-    for (const change &c : changes)
-        list.push(change_node(c, compat));
-    node doc = node::object();
+    // The verdict comes before the changes in the document: a first pass
+    // finds it, a second writes the changes batch by batch, as to_json of the
+    // whole document would.
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) { judged(batch); });
+    tree_writer w(tree_writer::style::json, out);
+    w.begin_object();
     if (compat)
-        doc.add("compatible", node::real(breaks ? "false" : "true"));
+        w.members(node::object().add("compatible", node::real(breaks ? "false" : "true")));
     else
-        doc.add("equal", node::real(changes.empty() ? "true" : "false"));
-    out << to_json(doc.add("changes", list));
+        w.members(node::object().add("equal", node::real(count ? "false" : "true")));
+    w.begin_array("changes", count);
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+        if (compat)
+            judge(batch);
+        for (const change &c : batch)
+            w.item(change_node(c, compat));
+    });
+    w.end();
+    w.end();
+    return (compat ? breaks : count > 0) ? 1 : 0;
 }
 
 } // namespace cdbdump

@@ -240,18 +240,6 @@ node dsect_node(const dsect &d, const anchor &a) {
 }
 
 namespace {
-void add_members(tree_writer &w, const node &object) {
-    flat_doc d;
-    to_flat(object, d);
-    w.members(d, 0);
-}
-
-void add_item(tree_writer &w, const node &n) {
-    flat_doc d;
-    to_flat(n, d);
-    w.item(d, 0);
-}
-
 const char *const record_size_names[NUM_RECORD_SIZES] = {
     "class", "cmmap", "manager", "variable_class", "pattr", "dattr", "action", "error", "depend",
 };
@@ -311,7 +299,7 @@ node to_tree(const cdb_file &f) {
 namespace {
 void begin_file(tree_writer &w, const cdb_file &f) {
     w.begin_object();
-    add_members(w, file_head(f));
+    w.members(file_head(f));
     w.begin_array("dsects", f.anchors.size());
 }
 
@@ -319,16 +307,16 @@ void begin_file(tree_writer &w, const cdb_file &f) {
 void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
     const auto *c = std::get_if<class_dsect>(&d);
     if (!c) {
-        add_item(w, dsect_node(d, a));
+        w.item(dsect_node(d, a));
         return;
     }
     w.begin_object();
-    add_members(w, dsect_head(a));
-    add_members(w, class_fields(*c));
+    w.members(dsect_head(a));
+    w.members(class_fields(*c));
     class_lists(*c, [&](const char *key, const auto &items, auto render) {
         w.begin_array(key, items.size());
         for (const auto &x : items)
-            add_item(w, render(x));
+            w.item(render(x));
         w.end();
     });
     w.end();

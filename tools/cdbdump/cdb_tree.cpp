@@ -133,6 +133,12 @@ void tree_writer::members(const flat_doc &d, size_t i) {
         member(d, c);
 }
 
+void tree_writer::members(const node &n) {
+    flat_doc d;
+    to_flat(n, d);
+    members(d, 0);
+}
+
 void tree_writer::begin_array(std::string_view key, size_t count) {
     size_t indent = open_.back().indent;
     line_.clear();
@@ -161,6 +167,12 @@ void tree_writer::item(const flat_doc &d, size_t i) {
     }
     a.done++;
     out_ << line_;
+}
+
+void tree_writer::item(const node &n) {
+    flat_doc d;
+    to_flat(n, d);
+    item(d, 0);
 }
 
 void tree_writer::end() {

@@ -79,12 +79,14 @@ class tree_writer {
     void begin_object();
     // The entry at i of d, under its key.
     void member(const flat_doc &d, size_t i);
-    // Each member of the object at i of d.
+    // Each member of the object at i of d, or of the object n.
     void members(const flat_doc &d, size_t i);
+    void members(const node &n);
     // A member holding `count` items, each then given by item or begin_object.
     void begin_array(std::string_view key, size_t count);
     // The entry at i of d as an item of the open array.
     void item(const flat_doc &d, size_t i);
+    void item(const node &n);
     // Closes the innermost object or array; closing the document ends it.
     void end();
 
