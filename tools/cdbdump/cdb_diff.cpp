@@ -48,15 +48,41 @@ std::vector<std::string> unique(std::vector<std::string> keys, const std::vector
 }
 
 // The named items of a list as path segments: quoted names, made unique.
-std::vector<std::string> item_keys(const node &list, part_map &parts) {
+template <typename L> std::vector<std::string> item_keys(const L &list, part_map &parts) {
     std::vector<std::string> keys;
     std::vector<node> given;
-    for (const node &i : list.items()) {
-        keys.push_back(c_quote(raw_name(i)));
-        given.push_back(node::object().add("name", node::string(raw_name(i))));
+    for (size_t i = 0; i < list.size(); i++) {
+        std::string name = list.name(i);
+        keys.push_back(c_quote(name));
+        given.push_back(node::object().add("name", node::string(name)));
     }
     return unique(keys, given, parts);
 }
+
+// A list of named items as the differ sees it: a list of a tree, whose
+// removed or added items are kept with the change, ...
+struct node_items {
+    const node &list;
+    size_t size() const { return list.items().size(); }
+    std::string name(size_t i) const { return raw_name(list.items()[i]); }
+    const node &item(size_t i) const { return list.items()[i]; }
+    void keep(change &c, size_t i) const { (c.what == change::kind::removed ? c.before : c.after) = item(i); }
+};
+
+// ... or the records of a class's model, whose trees are made only when
+// they are compared or written.
+template <typename T> struct record_items {
+    const std::vector<T> &list;
+    node (*render)(const T &);
+    size_t size() const { return list.size(); }
+    std::string name(size_t i) const { return list[i].name; }
+    node item(size_t i) const { return render(list[i]); }
+    void keep(change &c, size_t i) const {
+        c.content = [record = &list[i], r = render](tree_writer &w, std::string_view key) {
+            w.member(key, r(*record));
+        };
+    }
+};
 
 // Lists of named records: compared by name. The order of a structured-data
 // definition is its content; that of attributes and actions is not.
@@ -91,7 +117,7 @@ class differ {
         if (a.type() == node::kind::object && b.type() == node::kind::object)
             return objects(a, b, path);
         if (a.type() == node::kind::array && b.type() == node::kind::array && keyed(a) && keyed(b))
-            return lists(a, b, path, order_matters(key));
+            return lists(node_items{a}, node_items{b}, path, order_matters(key));
         if (!same(a, b))
             changes.push_back(change{change::kind::changed, path, a, b, false, ""});
     }
@@ -110,7 +136,7 @@ class differ {
     }
 
     // Named items matched by name; path ends with the list's key.
-    void lists(const node &a, const node &b, const path_t &path, bool ordered) {
+    template <typename L> void lists(const L &a, const L &b, const path_t &path, bool ordered) {
         std::vector<std::string> keys_a = item_keys(a, parts), keys_b = item_keys(b, parts);
         std::map<std::string, size_t> in_a, in_b;
         for (size_t i = 0; i < keys_a.size(); i++)
@@ -119,24 +145,51 @@ class differ {
             in_b[keys_b[i]] = i;
         node common_a = node::array(), common_b = node::array();
         for (size_t i = 0; i < keys_a.size(); i++) {
-            const node &item = a.items()[i];
             auto found = in_b.find(keys_a[i]);
             if (found == in_b.end()) {
-                changes.push_back(change{change::kind::removed, with(path, keys_a[i]), item, node::null(), false, ""});
+                changes.push_back(
+                    change{change::kind::removed, with(path, keys_a[i]), node::null(), node::null(), false, ""});
+                a.keep(changes.back(), i);
                 continue;
             }
-            common_a.push(node::string(raw_name(item)));
-            compare(item, b.items()[found->second], with(path, keys_a[i]), "");
+            common_a.push(node::string(a.name(i)));
+            compare(a.item(i), b.item(found->second), with(path, keys_a[i]), "");
         }
         for (size_t i = 0; i < keys_b.size(); i++) {
-            const node &item = b.items()[i];
-            if (in_a.count(keys_b[i]))
-                common_b.push(node::string(raw_name(item)));
-            else
-                changes.push_back(change{change::kind::added, with(path, keys_b[i]), node::null(), item, false, ""});
+            if (in_a.count(keys_b[i])) {
+                common_b.push(node::string(b.name(i)));
+                continue;
+            }
+            changes.push_back(
+                change{change::kind::added, with(path, keys_b[i]), node::null(), node::null(), false, ""});
+            b.keep(changes.back(), i);
         }
         if (ordered && !same(common_a, common_b))
             changes.push_back(change{change::kind::reordered, path, common_a, common_b, false, ""});
+    }
+
+    // Two dsects of one key: two classes field by field and then record list
+    // by record list, one pair of records' trees at a time; others whole.
+    void dsects(const dsect &a, const anchor &at_a, const dsect &b, const anchor &at_b, const std::string &key) {
+        const auto *ca = std::get_if<class_dsect>(&a), *cb = std::get_if<class_dsect>(&b);
+        if (!ca || !cb)
+            return compare(dsect_body(a, at_a), dsect_body(b, at_b), {key}, key);
+        objects(class_head(*ca, at_a), class_head(*cb, at_b), {key});
+        class_lists(*ca, *cb, [&](const char *list, const auto &items_a, const auto &items_b, auto render) {
+            using items = record_items<typename std::decay_t<decltype(items_a)>::value_type>;
+            lists(items{items_a, render}, items{items_b, render}, {key, list}, false);
+        });
+    }
+
+  private:
+    // A class's members before its record lists, without its kind.
+    static node class_head(const class_dsect &c, const anchor &a) {
+        node n = dsect_head(a);
+        n.erase("dsect");
+        node fields = class_fields(c);
+        for (const auto &m : fields.members())
+            n.add(m.first, m.second);
+        return n;
     }
 };
 
@@ -177,7 +230,6 @@ struct keyed_dsects {
         }
         keys = unique(keys, given, parts);
     }
-    node body(size_t i) const { return dsect_body(f, i); }
     // The header without its timestamp.
     node header() const {
         node h = *file_head(f.head()).find("header");
@@ -185,6 +237,15 @@ struct keyed_dsects {
         return h;
     }
 };
+
+// A dsect removed or added whole, read again and written record by record.
+std::function<void(tree_writer &, std::string_view)> whole_dsect(const dsect_source &f, size_t i) {
+    return [&f, i](tree_writer &w, std::string_view key) {
+        w.begin_object(key);
+        write_dsect_members(w, f.read(i), f.head().anchors[i], false);
+        w.end();
+    };
+}
 
 // The two files compared as objects of the header and one member per dsect
 // (as differ::objects compares objects), one pair of dsects at a time; the
@@ -199,26 +260,29 @@ template <typename F> void compare_files(differ &d, const keyed_dsects &a, const
     std::set<std::string> in_a(a.keys.begin(), a.keys.end());
     for (size_t i = 0; i < a.keys.size(); i++) {
         auto found = in_b.find(a.keys[i]);
-        if (found != in_b.end()) {
-            d.compare(a.body(i), b.body(found->second), {a.keys[i]}, a.keys[i]);
-        } else {
+        if (found == in_b.end()) {
             d.changes.push_back(change{change::kind::removed, {a.keys[i]}, node::null(), node::null(), false, ""});
-            d.changes.back().whole = {&a.f, i};
+            d.changes.back().content = whole_dsect(a.f, i);
+            flush();
+            continue;
         }
-        flush();
+        size_t j = found->second;
+        dsect old_dsect = a.f.read(i), new_dsect = b.f.read(j);
+        d.dsects(old_dsect, a.f.head().anchors[i], new_dsect, b.f.head().anchors[j], a.keys[i]);
+        flush(); // while the records its changes refer to are there
     }
     for (size_t i = 0; i < b.keys.size(); i++) {
         if (in_a.count(b.keys[i]))
             continue;
         d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), node::null(), false, ""});
-        d.changes.back().whole = {&b.f, i};
+        d.changes.back().content = whole_dsect(b.f, i);
         flush();
     }
 }
 } // namespace
 
-node dsect_body(const dsect_source &f, size_t i) {
-    node b = dsect_node(f.read(i), f.head().anchors[i]);
+node dsect_body(const dsect &d, const anchor &a) {
+    node b = dsect_node(d, a);
     b.erase("dsect");
     return b;
 }
@@ -248,8 +312,10 @@ void diff_each(const dsect_source &old_file, const dsect_source &new_file, const
 std::vector<change> diff(const dsect_source &old_file, const dsect_source &new_file) {
     std::vector<change> all;
     diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
-        for (change &c : batch)
+        for (change &c : batch) {
+            c.content = nullptr; // it refers to records of this batch only
             all.push_back(std::move(c));
+        }
     });
     return all;
 }
@@ -404,18 +470,28 @@ std::string change_line(const change &c, bool compat) {
     return s + (compat ? " (" + c.reason + ")" : "") + "\n";
 }
 
-node change_node(const change &c, bool compat) {
+// One change as an item of the document's list; what was removed or added
+// whole is written as it is read.
+void write_change(tree_writer &w, const change &c, bool compat) {
     node path = node::array();
     for (const node &part : c.parts)
         path.push(part);
-    node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
-    // A dsect removed or added whole is read again from its file.
+    w.begin_object();
+    w.members(node::object().add("change", node::token(kind_name(c.what))).add("path", path));
     bool removed = c.what == change::kind::removed;
-    n.add("old", c.whole.file && removed ? dsect_body(*c.whole.file, c.whole.index) : c.before);
-    n.add("new", c.whole.file && !removed ? dsect_body(*c.whole.file, c.whole.index) : c.after);
+    if (c.content && removed)
+        c.content(w, "old");
+    else
+        w.member("old", c.before);
+    if (c.content && !removed)
+        c.content(w, "new");
+    else
+        w.member("new", c.after);
     if (compat)
-        n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
-    return n;
+        w.members(node::object()
+                      .add("breaking", node::real(c.breaking ? "true" : "false"))
+                      .add("reason", node::string(c.reason)));
+    w.end();
 }
 } // namespace
 
@@ -464,7 +540,7 @@ int report_changes(const dsect_source &old_file, const dsect_source &new_file, b
         if (compat)
             judge(batch);
         for (const change &c : batch)
-            w.item(change_node(c, compat));
+            write_change(w, c, compat);
     });
     w.end();
     w.end();

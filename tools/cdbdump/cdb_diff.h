@@ -28,24 +28,22 @@ struct change {
     // {"name": name}, each with "occurrence" from the second of one name on;
     // a member's key as a string.
     std::vector<node> parts = {};
-    // A dsect removed or added whole: its content is not held but read again
-    // from its file when it is written (before or after stays null).
-    struct dsect_ref {
-        const dsect_source *file = nullptr;
-        size_t index = 0;
-    } whole = {};
+    // What was removed or added, when it is not held in before or after:
+    // written from the files as the member `key` of the change's document.
+    std::function<void(tree_writer &w, std::string_view key)> content = {};
 };
 
-// The differences in a stable order: the old file's order, additions after.
-// The changes refer to the files, which must outlive them.
+// The differences in a stable order: the old file's order, additions after;
+// what was removed or added whole is not kept (its before or after is null).
 std::vector<change> diff(const dsect_source &old_file, const dsect_source &new_file);
 // The same in batches, each of the changes of the header or of one dsect, so
-// that only one batch is held at a time.
+// that only one batch is held at a time; the content of a batch's changes
+// can be written only while the batch is handed over.
 using change_consumer = std::function<void(std::vector<change> &&batch)>;
 void diff_each(const dsect_source &old_file, const dsect_source &new_file, const change_consumer &each);
 std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file);
-// The content of dsect i as the diff compares it: its tree without its kind.
-node dsect_body(const dsect_source &f, size_t i);
+// The content of a dsect as the diff compares it: its tree without its kind.
+node dsect_body(const dsect &d, const anchor &a);
 // Applies the compatibility rules: marks each change breaking or not, with its
 // reason; an item that left one list for another of its class becomes one
 // change (persistence or scope).

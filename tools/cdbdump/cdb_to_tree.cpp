@@ -96,6 +96,8 @@ void attr_tail(const attr_common &a, const prop_table &props, node &n) {
         .add("max_sd_index", node::uinteger(a.max_sd_idx));
 }
 
+} // namespace
+
 node pattr_node(const pattr &p) {
     node n = attr_head(p);
     attr_tail(p, pattr_props, n);
@@ -134,12 +136,16 @@ node action_node(const action &x) {
         .add("sd_response", sd_node(x.sd_response));
 }
 
+namespace {
+
 template <typename T, typename F> node list_node(const std::vector<T> &items, F f) {
     node a = node::array();
     for (const T &i : items)
         a.push(f(i));
     return a;
 }
+
+} // namespace
 
 // Everything of a class but its record lists.
 node class_fields(const class_dsect &c) {
@@ -161,19 +167,13 @@ node class_fields(const class_dsect &c) {
         .add("reset_sd", sd_node(c.reset_sd));
 }
 
-// Calls each(key, records, render) for the record lists of a class, in document order.
-template <typename F> void class_lists(const class_dsect &c, F each) {
-    each("persistent_class_attributes", c.pattrs_class, pattr_node);
-    each("dynamic_class_attributes", c.dattrs_class, dattr_node);
-    each("persistent_resource_attributes", c.pattrs, pattr_node);
-    each("dynamic_resource_attributes", c.dattrs, dattr_node);
-    each("class_actions", c.actions_class, action_node);
-    each("resource_actions", c.actions, action_node);
-}
+namespace {
 
 node class_node(const class_dsect &c) {
     node n = class_fields(c);
-    class_lists(c, [&](const char *key, const auto &items, auto render) { n.add(key, list_node(items, render)); });
+    class_lists(c, c, [&](const char *key, const auto &items, const auto &, auto render) {
+        n.add(key, list_node(items, render));
+    });
     return n;
 }
 
@@ -212,12 +212,13 @@ node var_class_node(const var_class_dsect &v) {
         .add("variable_ids", ids);
 }
 
+} // namespace
+
 node dsect_head(const anchor &a) {
     return node::object()
         .add("dsect", node::token(dsect_kind_name(a.type)))
         .add("revision", node::uinteger(a.revision));
 }
-} // namespace
 
 node dsect_node(const dsect &d, const anchor &a) {
     node head = dsect_head(a);
@@ -296,6 +297,24 @@ node to_tree(const cdb_file &f) {
     return file_head(f).add("dsects", dsects);
 }
 
+// A class is written record by record, so that only one record's tree is held.
+void write_dsect_members(tree_writer &w, const dsect &d, const anchor &a, bool with_kind) {
+    const auto *c = std::get_if<class_dsect>(&d);
+    node head = c ? dsect_head(a) : dsect_node(d, a);
+    if (!with_kind)
+        head.erase("dsect");
+    w.members(head);
+    if (!c)
+        return;
+    w.members(class_fields(*c));
+    class_lists(*c, *c, [&](const char *key, const auto &items, const auto &, auto render) {
+        w.begin_array(key, items.size());
+        for (const auto &x : items)
+            w.item(render(x));
+        w.end();
+    });
+}
+
 namespace {
 void begin_file(tree_writer &w, const cdb_file &f) {
     w.begin_object();
@@ -303,22 +322,9 @@ void begin_file(tree_writer &w, const cdb_file &f) {
     w.begin_array("dsects", f.anchors.size());
 }
 
-// A class is written record by record, so that only one record's tree is held.
 void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
-    const auto *c = std::get_if<class_dsect>(&d);
-    if (!c) {
-        w.item(dsect_node(d, a));
-        return;
-    }
     w.begin_object();
-    w.members(dsect_head(a));
-    w.members(class_fields(*c));
-    class_lists(*c, [&](const char *key, const auto &items, auto render) {
-        w.begin_array(key, items.size());
-        for (const auto &x : items)
-            w.item(render(x));
-        w.end();
-    });
+    write_dsect_members(w, d, a, true);
     w.end();
 }
 

@@ -99,6 +99,8 @@ void tree_writer::begin_object() {
         out_ << "{";
 }
 
+void tree_writer::begin_object(std::string_view key) { open_member(key, false, false); }
+
 void tree_writer::next_member(std::string_view key) {
     frame &o = open_.back();
     line_ += o.done ? ",\n" : "\n";
@@ -133,26 +135,36 @@ void tree_writer::members(const flat_doc &d, size_t i) {
         member(d, c);
 }
 
+void tree_writer::member(std::string_view key, const node &n) {
+    flat_doc d;
+    to_flat(n, d, key);
+    member(d, 0);
+}
+
 void tree_writer::members(const node &n) {
     flat_doc d;
     to_flat(n, d);
     members(d, 0);
 }
 
-void tree_writer::begin_array(std::string_view key, size_t count) {
+void tree_writer::begin_array(std::string_view key, size_t count) { open_member(key, true, count == 0); }
+
+// A member whose value is given piece by piece; an empty array is closed at
+// once in the text.
+void tree_writer::open_member(std::string_view key, bool array, bool empty) {
     size_t indent = open_.back().indent;
     line_.clear();
     if (style_ == style::json) {
         next_member(key);
-        line_ += '[';
+        line_ += array ? '[' : '{';
     } else {
         line_.append(indent, ' ');
         line_ += key;
-        line_ += count ? ":\n" : ": []\n";
+        line_ += empty ? ": []\n" : ":\n";
         mark_item_start(indent);
     }
     out_ << line_;
-    open_.push_back({true, indent + 2, 0});
+    open_.push_back({array, indent + 2, 0});
 }
 
 void tree_writer::item(const flat_doc &d, size_t i) {

@@ -75,10 +75,13 @@ class tree_writer {
   public:
     enum class style { json, text };
     tree_writer(style s, text_sink &out) : style_(s), out_(out) {}
-    // The document itself, or an item of the open array.
+    // The document itself, or an item of the open array; or a member of the
+    // open object.
     void begin_object();
-    // The entry at i of d, under its key.
+    void begin_object(std::string_view key);
+    // The entry at i of d, under its key; or n under key.
     void member(const flat_doc &d, size_t i);
+    void member(std::string_view key, const node &n);
     // Each member of the object at i of d, or of the object n.
     void members(const flat_doc &d, size_t i);
     void members(const node &n);
@@ -96,6 +99,7 @@ class tree_writer {
         size_t indent, done;
     };
     void next_member(std::string_view key);
+    void open_member(std::string_view key, bool array, bool empty);
     void mark_item_start(size_t indent);
     style style_;
     text_sink &out_;
