@@ -186,17 +186,12 @@ class class_printer {
     void value(std::string_view key, const cdb_value_t &v) {
         if (cdb_value_is_none(&v))
             return d_.null(key);
-        switch (v.type) {
-        case CDB_INT32:
-        case CDB_UINT32:
-        case CDB_INT64:
-        case CDB_UINT64:
-        case CDB_FLOAT32:
-        case CDB_FLOAT64: {
+        if (is_number_type(v.type)) {
             uint64_t bits = 0;
             cdb_value_bits(&v, &bits);
             return number(key, v.type, bits);
         }
+        switch (v.type) {
         case CDB_UNKNOWN:
         case CDB_NONE_TYPE:
         case CDB_SBS: return d_.bytes(key, db_.data + v.at, 8); // the 8 bytes as stored
@@ -217,15 +212,9 @@ class class_printer {
         }
     }
 
-    // The 20 bytes of the handle as stored.
     void handle(std::string_view key, const cdb_value_t &v) {
-        cdb_handle_t h;
-        cdb_value_handle(&v, &h);
-        const uint32_t words[5] = {h.header, h.id[0], h.id[1], h.id[2], h.id[3]};
-        uint8_t bytes[20];
-        for (int w = 0; w < 5; w++)
-            for (int i = 0; i < 4; i++)
-                bytes[4 * w + i] = uint8_t(words[w] >> (db_.big_endian ? 8 * (3 - i) : 8 * i));
+        uint8_t bytes[HANDLE_SIZE];
+        handle_bytes(v, db_.big_endian != 0, bytes);
         d_.bytes(key, bytes, sizeof bytes);
     }
 

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <vector>
 
+#include "cdb_names.h"
+
 namespace cdbdump {
 
 namespace {
@@ -15,16 +17,12 @@ value read_value(const cdb_value_t &v, bool big_endian) {
     if (cdb_value_is_none(&v))
         return out;
     const unsigned char *data = v.cls->db->data;
-    switch (v.type) {
-    case CDB_INT32:
-    case CDB_UINT32:
-    case CDB_INT64:
-    case CDB_UINT64:
-    case CDB_FLOAT32:
-    case CDB_FLOAT64:
+    if (is_number_type(v.type)) {
         out.kind = value_kind::number;
         cdb_value_bits(&v, &out.bits);
         return out;
+    }
+    switch (v.type) {
     case CDB_UNKNOWN:
     case CDB_NONE_TYPE:
     case CDB_SBS:
@@ -47,16 +45,11 @@ value read_value(const cdb_value_t &v, bool big_endian) {
         out.bytes.assign(p, p + n);
         return out;
     }
-    case CDB_RH: {
-        cdb_handle_t h;
-        cdb_value_handle(&v, &h);
-        out.kind = value_kind::handle; // the 20 bytes as stored
-        const uint32_t words[5] = {h.header, h.id[0], h.id[1], h.id[2], h.id[3]};
-        for (uint32_t w : words)
-            for (int i = 0; i < 4; i++)
-                out.bytes.push_back(uint8_t(w >> (big_endian ? 8 * (3 - i) : 8 * i)));
+    case CDB_RH:
+        out.kind = value_kind::handle;
+        out.bytes.resize(HANDLE_SIZE);
+        handle_bytes(v, big_endian, out.bytes.data());
         return out;
-    }
     default: {
         out.kind = v.type == CDB_SD ? value_kind::sd : value_kind::array;
         uint32_t n = 0;
@@ -263,6 +256,15 @@ class model_reader {
 };
 
 } // namespace
+
+void handle_bytes(const cdb_value_t &v, bool big_endian, uint8_t *out) {
+    cdb_handle_t h;
+    cdb_value_handle(&v, &h);
+    const uint32_t words[5] = {h.header, h.id[0], h.id[1], h.id[2], h.id[3]};
+    for (int w = 0; w < 5; w++)
+        for (int i = 0; i < 4; i++)
+            out[4 * w + i] = uint8_t(words[w] >> (big_endian ? 8 * (3 - i) : 8 * i));
+}
 
 bool open_checked(const uint8_t *data, size_t size, cdb_t &db) {
     if (cdb_open(&db, data, size) != CDB_OK)

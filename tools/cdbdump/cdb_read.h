@@ -16,6 +16,10 @@ namespace cdbdump {
 // Whether the library's full check (with its overlap map) accepts the image.
 bool library_accepts(const uint8_t *data, size_t size);
 
+// The 20 bytes of a resource handle value as stored.
+constexpr size_t HANDLE_SIZE = 20;
+void handle_bytes(const cdb_value_t &v, bool big_endian, uint8_t *out);
+
 // Opens the image when the library's full check accepts it.
 bool open_checked(const uint8_t *data, size_t size, cdb_t &db);
 // The header and anchors of an opened image (no dsect).
