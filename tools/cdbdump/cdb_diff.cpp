@@ -14,7 +14,23 @@ namespace cdbdump {
 namespace {
 using path_t = std::vector<std::string>;
 
-bool same(const node &a, const node &b) { return to_json_line(a) == to_json_line(b); }
+// Whether the two render the same JSON: numbers and strings compare by their
+// text whatever their kind, objects member by member.
+bool same(const node &a, const node &b) {
+    auto json_kind = [](node::kind k) {
+        return k == node::kind::real ? node::kind::integer : k == node::kind::token ? node::kind::string : k;
+    };
+    if (json_kind(a.type()) != json_kind(b.type()) || a.text() != b.text() ||
+        a.members().size() != b.members().size() || a.items().size() != b.items().size())
+        return false;
+    for (size_t i = 0; i < a.members().size(); i++)
+        if (a.members()[i].first != b.members()[i].first || !same(a.members()[i].second, b.members()[i].second))
+            return false;
+    for (size_t i = 0; i < a.items().size(); i++)
+        if (!same(a.items()[i], b.items()[i]))
+            return false;
+    return true;
+}
 
 const node *member(const node &n, const std::string &key) {
     for (const auto &m : n.members())
