@@ -307,4 +307,9 @@ TEST(Diff, JsonShowsWhatWasRemovedOrAddedAsTheFileHoldsIt) {
         std::string shown = content.find("\"revision\"") == 1 ? "{\"dsect\":\"class\"," + content.substr(1) : content;
         EXPECT_NE(doc.find(shown), std::string::npos) << key << ": " << content;
     }
+    // A record that moved to another list is one change naming the two lists.
+    std::string moved = d.compile(edited(d.base, {{"ResourceAction", "ClassAction"}}), "moved.cdef");
+    EXPECT_NE(compact(d.cdbdump("--compat --json " + old_cdb + " " + moved).out)
+                  .find("{\"name\":\"Reset\"}],\"old\":\"resource_actions\",\"new\":\"class_actions\""),
+              std::string::npos);
 }

@@ -494,12 +494,11 @@ void write_change(tree_writer &w, const change &c, bool compat) {
         path.push(part);
     w.begin_object();
     w.members(node::object().add("change", node::token(kind_name(c.what))).add("path", path));
-    bool removed = c.what == change::kind::removed;
-    if (c.content && removed)
+    if (c.content && c.what == change::kind::removed)
         c.content(w, "old");
     else
         w.member("old", c.before);
-    if (c.content && !removed)
+    if (c.content && c.what == change::kind::added)
         c.content(w, "new");
     else
         w.member("new", c.after);
