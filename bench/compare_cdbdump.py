@@ -1,11 +1,12 @@
 #!/usr/bin/env python3
 """Compares two cdbdump binaries on many CDBs: every end-to-end source, every
 example and the generated sources of compare_builds.py, compiled plainly and
-with -s, and mutated copies of those images (a byte changed, with and without
-the checksum made right again, or the file cut short). Every mode (text,
---check, --json, --annotate, --source) runs on every image, and --diff
-and --compat on neighbouring pairs; the exit status, standard
-output and standard error must agree.
+with -s, the CDBs of cdbdump's fuzz corpus, and mutated copies of those images
+(a byte changed, with and without the checksum made right again, or the file
+cut short). Every mode (text, --check, --json, --annotate, --source,
+--header) runs on every image, and --diff and --compat, plain and with
+--json, on neighbouring pairs; the exit status, standard output and standard
+error must agree.
 
     bench/compare_cdbdump.py QECFG OLD_CDBDUMP NEW_CDBDUMP [--generated N] [--mutations M]
 
@@ -24,10 +25,9 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 sys.path.insert(0, HERE)
 import compare_builds as builds  # noqa: E402  (the sources and generator of the compiler's comparison)
 
-SINGLE = ([], ["--check"], ["--json"], ["--annotate"], ["--source"])
-# --diff --json and --compat --json are left out: their path parts are
-# structured now, a deliberate change of their output.
-PAIRS = (["--diff"], ["--compat"])
+SINGLE = ([], ["--check"], ["--json"], ["--annotate"], ["--source"], ["--header"])
+PAIRS = (["--diff"], ["--compat"], ["--diff", "--json"], ["--compat", "--json"])
+CORPUS = os.path.join(HERE, "..", "fuzz", "corpus", "cdbdump")
 
 
 def compile_all(qecfg, items, out_dir):
@@ -85,7 +85,7 @@ def compare(old, new, args, label):
     if a == b:
         return None
     what = [k for k, x, y in zip(("status", "stdout", "stderr"), a, b) if x != y]
-    return "%s %s: %s differ" % (label, " ".join(args[:-1] if len(args) > 1 else args), ", ".join(what))
+    return "%s %s: %s differ" % (label, " ".join(args), ", ".join(what))
 
 
 def main():
@@ -102,6 +102,7 @@ def main():
         items.append(("generated/%d" % seed, ("\n".join(builds.Source(random.Random(seed)).text()) + "\n").encode()))
     with tempfile.TemporaryDirectory(prefix="cdbdump-compare-") as tmp:
         images = compile_all(os.path.abspath(args.qecfg), items, tmp)
+        images += [("corpus/" + f, os.path.join(CORPUS, f)) for f in sorted(os.listdir(CORPUS))]
         images += mutate_all(images, args.mutations, tmp)
         jobs = []
         for i, (label, path) in enumerate(images):

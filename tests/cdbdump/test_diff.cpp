@@ -240,3 +240,76 @@ TEST(Diff, JsonDocumentAndErrors) {
     for (const std::string &args : bad)
         EXPECT_EQ(d.cdbdump(args).status, 2) << args;
 }
+
+namespace {
+// The JSON without the blanks and line ends outside strings.
+std::string compact(const std::string &json) {
+    std::string out;
+    bool in_string = false;
+    for (size_t i = 0; i < json.size(); i++) {
+        char ch = json[i];
+        if (in_string && ch == '\\') {
+            out += json.substr(i++, 2);
+            continue;
+        }
+        if (ch == '"')
+            in_string = !in_string;
+        if (in_string || (ch != ' ' && ch != '\n'))
+            out += ch;
+    }
+    return out;
+}
+
+// The compact object or array that follows `key` in a compact document.
+std::string value_after(const std::string &doc, const std::string &key) {
+    size_t at = doc.find(key);
+    if (at == std::string::npos)
+        return "";
+    size_t start = at + key.size(), depth = 0;
+    bool in_string = false;
+    for (size_t i = start; i < doc.size(); i++) {
+        char ch = doc[i];
+        if (in_string && ch == '\\')
+            i++;
+        else if (ch == '"')
+            in_string = !in_string;
+        else if (!in_string && (ch == '{' || ch == '['))
+            depth++;
+        else if (!in_string && (ch == '}' || ch == ']') && --depth == 0)
+            return doc.substr(start, i + 1 - start);
+    }
+    return "";
+}
+} // namespace
+
+// What --diff --json shows of a class or an attribute removed or added whole
+// is what --json shows of it in its file.
+TEST(Diff, JsonShowsWhatWasRemovedOrAddedAsTheFileHoldsIt) {
+    diff_dir d;
+    std::string old_cdb = d.compile(d.base, "old.cdef");
+    std::string new_cdb = d.compile(
+        edited(d.base, {{"    Name=Diff.Tape\n", "    Name=Diff.Reel\n"}, {"    Name=Blocks\n", "    Name=Sectors\n"}}),
+        "new.cdef", true);
+    run_result diff = d.cdbdump("--diff --json " + old_cdb + " " + new_cdb);
+    ASSERT_EQ(diff.status, 1) << diff.out;
+    std::string changes = compact(diff.out), old_doc = compact(d.cdbdump("--json " + old_cdb).out),
+                new_doc = compact(d.cdbdump("--json " + new_cdb).out);
+    const std::pair<const char *, const std::string &> cases[] = {
+        {"{\"dsect\":\"class\",\"name\":\"Diff.Tape\"}],\"old\":", old_doc},
+        {"{\"dsect\":\"class\",\"name\":\"Diff.Reel\"}],\"old\":null,\"new\":", new_doc},
+        {"{\"name\":\"Blocks\"}],\"old\":", old_doc},
+        {"{\"name\":\"Sectors\"}],\"old\":null,\"new\":", new_doc},
+    };
+    for (const auto &[key, doc] : cases) {
+        std::string content = value_after(changes, key);
+        ASSERT_GT(content.size(), 20u) << key << "\n" << diff.out;
+        // In the file's document a dsect also carries its kind.
+        std::string shown = content.find("\"revision\"") == 1 ? "{\"dsect\":\"class\"," + content.substr(1) : content;
+        EXPECT_NE(doc.find(shown), std::string::npos) << key << ": " << content;
+    }
+    // A record that moved to another list is one change naming the two lists.
+    std::string moved = d.compile(edited(d.base, {{"ResourceAction", "ClassAction"}}), "moved.cdef");
+    EXPECT_NE(compact(d.cdbdump("--compat --json " + old_cdb + " " + moved).out)
+                  .find("{\"name\":\"Reset\"}],\"old\":\"resource_actions\",\"new\":\"class_actions\""),
+              std::string::npos);
+}

@@ -119,7 +119,7 @@ TEST(Limits, MemoryExhaustionEndsWithAMessage) {
     if (sanitized)
         GTEST_SKIP() << "the sanitizers need more address space than the limit leaves";
     const work_dir &w = large();
-    run_result r = shell(w, "ulimit -v 40000; " + dump + " --diff large.cdef large.cdef >/dev/null");
+    run_result r = shell(w, "ulimit -v 40000; " + dump + " --annotate large.cdef >/dev/null");
     EXPECT_EQ(r.status, 2) << r.err;
     EXPECT_EQ(r.err, "cdbdump: out of memory\n");
 }
@@ -176,4 +176,34 @@ TEST(Limits, InputRefusedBeforeItIsRead) {
     run_result dir = shell(w, dump + " .");
     EXPECT_EQ(dir.status, 2);
     EXPECT_EQ(dir.err, "cdbdump: .: cannot read: Is a directory\n");
+}
+
+// --diff and --compat hold one pair of dsects and the changes of one dsect at
+// a time: the two files plus 10 times the largest dsect plus 16 MB, even when
+// every dsect or every attribute differs.
+TEST(Limits, DiffMemoryStaysWithinAFewTimesTheFiles) {
+    if (sanitized)
+        GTEST_SKIP() << "peak memory is not the program's own under the sanitizers";
+    const work_dir &w = large();
+    std::string renamed_classes = large_source(4, 6000), renamed_attrs = renamed_classes;
+    for (size_t at; (at = renamed_classes.find("Large.Class")) != std::string::npos;)
+        renamed_classes.replace(at, 5, "Other");
+    for (size_t at; (at = renamed_attrs.find("Name=Attr")) != std::string::npos;)
+        renamed_attrs.replace(at, 9, "Name=Prop");
+    std::ofstream(w.path / "classes.src") << renamed_classes;
+    std::ofstream(w.path / "attrs.src") << renamed_attrs;
+    ASSERT_EQ(shell(w, std::string(QECFG_BIN) + " classes.src classes.cdef").status, 0);
+    ASSERT_EQ(shell(w, std::string(QECFG_BIN) + " attrs.src attrs.cdef").status, 0);
+    long file_kb = long(fs::file_size(w.path / "large.cdef") / 1024);
+    long bound_kb = 2 * file_kb + 10 * file_kb / 4 + 16 * 1024;
+    const std::pair<const char *, int> runs[] = {
+        {"--diff large.cdef classes.cdef", 1},        {"--diff --json large.cdef classes.cdef", 1},
+        {"--compat --json large.cdef attrs.cdef", 1}, {"--diff large.cdef attrs.cdef", 1},
+        {"--compat large.cdef large.cdef", 0},
+    };
+    for (const auto &[args, status] : runs) {
+        run_result r = shell(w, dump + " " + args + " >/dev/null");
+        EXPECT_EQ(r.status, status) << args << ": " << r.err;
+        EXPECT_LE(r.peak_kb, bound_kb) << args << ": " << r.peak_kb << " KB for files of " << file_kb << " KB";
+    }
 }

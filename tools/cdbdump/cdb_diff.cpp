@@ -4,6 +4,7 @@
 #include <map>
 #include <set>
 
+#include "cdb_dsects.h"
 #include "cdb_names.h"
 #include "cdb_text.h"
 #include "cdb_to_tree.h"
@@ -13,7 +14,23 @@ namespace cdbdump {
 namespace {
 using path_t = std::vector<std::string>;
 
-bool same(const node &a, const node &b) { return to_json_line(a) == to_json_line(b); }
+// Whether the two render the same JSON: numbers and strings compare by their
+// text whatever their kind, objects member by member.
+bool same(const node &a, const node &b) {
+    auto json_kind = [](node::kind k) {
+        return k == node::kind::real ? node::kind::integer : k == node::kind::token ? node::kind::string : k;
+    };
+    if (json_kind(a.type()) != json_kind(b.type()) || a.text() != b.text() ||
+        a.members().size() != b.members().size() || a.items().size() != b.items().size())
+        return false;
+    for (size_t i = 0; i < a.members().size(); i++)
+        if (a.members()[i].first != b.members()[i].first || !same(a.members()[i].second, b.members()[i].second))
+            return false;
+    for (size_t i = 0; i < a.items().size(); i++)
+        if (!same(a.items()[i], b.items()[i]))
+            return false;
+    return true;
+}
 
 const node *member(const node &n, const std::string &key) {
     for (const auto &m : n.members())
@@ -47,15 +64,41 @@ std::vector<std::string> unique(std::vector<std::string> keys, const std::vector
 }
 
 // The named items of a list as path segments: quoted names, made unique.
-std::vector<std::string> item_keys(const node &list, part_map &parts) {
+template <typename L> std::vector<std::string> item_keys(const L &list, part_map &parts) {
     std::vector<std::string> keys;
     std::vector<node> given;
-    for (const node &i : list.items()) {
-        keys.push_back(c_quote(raw_name(i)));
-        given.push_back(node::object().add("name", node::string(raw_name(i))));
+    for (size_t i = 0; i < list.size(); i++) {
+        std::string name = list.name(i);
+        keys.push_back(c_quote(name));
+        given.push_back(node::object().add("name", node::string(name)));
     }
     return unique(keys, given, parts);
 }
+
+// A list of named items as the differ sees it: a list of a tree, whose
+// removed or added items are kept with the change, ...
+struct node_items {
+    const node &list;
+    size_t size() const { return list.items().size(); }
+    std::string name(size_t i) const { return raw_name(list.items()[i]); }
+    const node &item(size_t i) const { return list.items()[i]; }
+    void keep(change &c, size_t i) const { (c.what == change::kind::removed ? c.before : c.after) = item(i); }
+};
+
+// ... or the records of a class's model, whose trees are made only when
+// they are compared or written.
+template <typename T> struct record_items {
+    const std::vector<T> &list;
+    node (*render)(const T &);
+    size_t size() const { return list.size(); }
+    std::string name(size_t i) const { return list[i].name; }
+    node item(size_t i) const { return render(list[i]); }
+    void keep(change &c, size_t i) const {
+        c.content = [record = &list[i], r = render](tree_writer &w, std::string_view key) {
+            w.member(key, r(*record));
+        };
+    }
+};
 
 // Lists of named records: compared by name. The order of a structured-data
 // definition is its content; that of attributes and actions is not.
@@ -90,7 +133,7 @@ class differ {
         if (a.type() == node::kind::object && b.type() == node::kind::object)
             return objects(a, b, path);
         if (a.type() == node::kind::array && b.type() == node::kind::array && keyed(a) && keyed(b))
-            return lists(a, b, path, order_matters(key));
+            return lists(node_items{a}, node_items{b}, path, order_matters(key));
         if (!same(a, b))
             changes.push_back(change{change::kind::changed, path, a, b, false, ""});
     }
@@ -109,7 +152,7 @@ class differ {
     }
 
     // Named items matched by name; path ends with the list's key.
-    void lists(const node &a, const node &b, const path_t &path, bool ordered) {
+    template <typename L> void lists(const L &a, const L &b, const path_t &path, bool ordered) {
         std::vector<std::string> keys_a = item_keys(a, parts), keys_b = item_keys(b, parts);
         std::map<std::string, size_t> in_a, in_b;
         for (size_t i = 0; i < keys_a.size(); i++)
@@ -118,24 +161,51 @@ class differ {
             in_b[keys_b[i]] = i;
         node common_a = node::array(), common_b = node::array();
         for (size_t i = 0; i < keys_a.size(); i++) {
-            const node &item = a.items()[i];
             auto found = in_b.find(keys_a[i]);
             if (found == in_b.end()) {
-                changes.push_back(change{change::kind::removed, with(path, keys_a[i]), item, node::null(), false, ""});
+                changes.push_back(
+                    change{change::kind::removed, with(path, keys_a[i]), node::null(), node::null(), false, ""});
+                a.keep(changes.back(), i);
                 continue;
             }
-            common_a.push(node::string(raw_name(item)));
-            compare(item, b.items()[found->second], with(path, keys_a[i]), "");
+            common_a.push(node::string(a.name(i)));
+            compare(a.item(i), b.item(found->second), with(path, keys_a[i]), "");
         }
         for (size_t i = 0; i < keys_b.size(); i++) {
-            const node &item = b.items()[i];
-            if (in_a.count(keys_b[i]))
-                common_b.push(node::string(raw_name(item)));
-            else
-                changes.push_back(change{change::kind::added, with(path, keys_b[i]), node::null(), item, false, ""});
+            if (in_a.count(keys_b[i])) {
+                common_b.push(node::string(b.name(i)));
+                continue;
+            }
+            changes.push_back(
+                change{change::kind::added, with(path, keys_b[i]), node::null(), node::null(), false, ""});
+            b.keep(changes.back(), i);
         }
         if (ordered && !same(common_a, common_b))
             changes.push_back(change{change::kind::reordered, path, common_a, common_b, false, ""});
+    }
+
+    // Two dsects of one key: two classes field by field and then record list
+    // by record list, one pair of records' trees at a time; others whole.
+    void dsects(const dsect &a, const anchor &at_a, const dsect &b, const anchor &at_b, const std::string &key) {
+        const auto *ca = std::get_if<class_dsect>(&a), *cb = std::get_if<class_dsect>(&b);
+        if (!ca || !cb)
+            return compare(dsect_body(a, at_a), dsect_body(b, at_b), {key}, key);
+        objects(class_head(*ca, at_a), class_head(*cb, at_b), {key});
+        class_lists(*ca, *cb, [&](const char *list, const auto &items_a, const auto &items_b, auto render) {
+            using items = record_items<typename std::decay_t<decltype(items_a)>::value_type>;
+            lists(items{items_a, render}, items{items_b, render}, {key, list}, false);
+        });
+    }
+
+  private:
+    // A class's members before its record lists, without its kind.
+    static node class_head(const class_dsect &c, const anchor &a) {
+        node n = dsect_head(a);
+        n.erase("dsect");
+        node fields = class_fields(c);
+        for (const auto &m : fields.members())
+            n.add(m.first, m.second);
+        return n;
     }
 };
 
@@ -154,73 +224,116 @@ std::string dsect_key(const node &d, node &part) {
 }
 
 // A file's dsects under their keys (dsect_key, made unique); each dsect is
-// made into its tree only when it is compared, so that the trees of one pair
-// are held at a time.
+// read and made into its tree only when it is compared, so that the trees of
+// one pair are held at a time.
 struct keyed_dsects {
-    const cdb_file &f;
+    const dsect_source &f;
     std::vector<std::string> keys;
 
-    keyed_dsects(const cdb_file &file, part_map &parts) : f(file) {
+    keyed_dsects(const dsect_source &file, part_map &parts) : f(file) {
         std::vector<node> given;
-        for (size_t i = 0; i < f.dsects.size() && i < f.anchors.size(); i++) {
+        for (size_t i = 0; i < f.count(); i++) {
             node part = node::null(),
-                 key = node::object().add("dsect", node::token(dsect_kind_name(f.anchors[i].type)));
-            if (auto *c = std::get_if<class_dsect>(&f.dsects[i]))
-                key.add("name", node::string(c->name));
-            if (auto *v = std::get_if<var_class_dsect>(&f.dsects[i]))
-                key.add("name", v->name ? node::string(*v->name) : node::null())
-                    .add("alias", v->alias ? node::string(*v->alias) : node::null());
+                 key = node::object().add("dsect", node::token(dsect_kind_name(f.head().anchors[i].type)));
+            auto opt = [](const std::optional<std::string> &s) { return s ? node::string(*s) : node::null(); };
+            dsect_source::names names = f.names_of(i);
+            if (f.head().anchors[i].type == CDB_DSECT_CLASS)
+                key.add("name", opt(names.name));
+            if (f.head().anchors[i].type == CDB_DSECT_VAR_CLASS)
+                key.add("name", opt(names.name)).add("alias", opt(names.alias));
             keys.push_back(dsect_key(key, part));
             given.push_back(std::move(part));
         }
         keys = unique(keys, given, parts);
     }
-    // The dsect's content: its tree without its kind, which the key holds.
-    node body(size_t i) const {
-        node b = dsect_node(f.dsects[i], f.anchors[i]);
-        b.erase("dsect");
-        return b;
-    }
     // The header without its timestamp.
     node header() const {
-        node h = *file_head(f).find("header");
+        node h = *file_head(f.head()).find("header");
         h.erase("timestamp");
         return h;
     }
 };
 
+// A dsect removed or added whole, read again and written record by record.
+std::function<void(tree_writer &, std::string_view)> whole_dsect(const dsect_source &f, size_t i) {
+    return [&f, i](tree_writer &w, std::string_view key) {
+        w.begin_object(key);
+        write_dsect_members(w, f.read(i), f.head().anchors[i], false);
+        w.end();
+    };
+}
+
 // The two files compared as objects of the header and one member per dsect
-// (as differ::objects compares objects), one pair of dsects at a time.
-void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b) {
+// (as differ::objects compares objects), one pair of dsects at a time; the
+// changes of the header and of each dsect go to `each` as one batch. A dsect
+// removed or added whole is only referred to.
+template <typename F> void compare_files(differ &d, const keyed_dsects &a, const keyed_dsects &b, F flush) {
     d.compare(a.header(), b.header(), {"header"}, "header");
+    flush();
     std::map<std::string, size_t> in_b;
     for (size_t i = 0; i < b.keys.size(); i++)
         in_b.emplace(b.keys[i], i);
     std::set<std::string> in_a(a.keys.begin(), a.keys.end());
     for (size_t i = 0; i < a.keys.size(); i++) {
         auto found = in_b.find(a.keys[i]);
-        if (found != in_b.end())
-            d.compare(a.body(i), b.body(found->second), {a.keys[i]}, a.keys[i]);
-        else
-            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, a.body(i), node::null(), false, ""});
+        if (found == in_b.end()) {
+            d.changes.push_back(change{change::kind::removed, {a.keys[i]}, node::null(), node::null(), false, ""});
+            d.changes.back().content = whole_dsect(a.f, i);
+            flush();
+            continue;
+        }
+        size_t j = found->second;
+        dsect old_dsect = a.f.read(i), new_dsect = b.f.read(j);
+        d.dsects(old_dsect, a.f.head().anchors[i], new_dsect, b.f.head().anchors[j], a.keys[i]);
+        flush(); // while the records its changes refer to are there
     }
-    for (size_t i = 0; i < b.keys.size(); i++)
-        if (!in_a.count(b.keys[i]))
-            d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), b.body(i), false, ""});
+    for (size_t i = 0; i < b.keys.size(); i++) {
+        if (in_a.count(b.keys[i]))
+            continue;
+        d.changes.push_back(change{change::kind::added, {b.keys[i]}, node::null(), node::null(), false, ""});
+        d.changes.back().content = whole_dsect(b.f, i);
+        flush();
+    }
 }
 } // namespace
 
+node dsect_body(const dsect &d, const anchor &a) {
+    node b = dsect_node(d, a);
+    b.erase("dsect");
+    return b;
+}
+
 std::vector<change> diff(const cdb_file &old_file, const cdb_file &new_file) {
+    return diff(*model_source(old_file), *model_source(new_file));
+}
+
+void diff_each(const dsect_source &old_file, const dsect_source &new_file, const change_consumer &each) {
     differ d;
-    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts));
-    // The first segment names a dsect (or is the header), a quoted one an item;
-    // any other is a member's key.
-    for (change &c : d.changes)
-        for (size_t i = 0; i < c.path.size(); i++) {
-            auto part = i == 0 || c.path[i][0] == '"' ? d.parts.find(c.path[i]) : d.parts.end();
-            c.parts.push_back(part == d.parts.end() ? node::string(c.path[i]) : part->second);
+    auto flush = [&] {
+        if (d.changes.empty())
+            return;
+        // The first segment names a dsect (or is the header), a quoted one an
+        // item; any other is a member's key.
+        for (change &c : d.changes)
+            for (size_t i = 0; i < c.path.size(); i++) {
+                auto part = i == 0 || c.path[i][0] == '"' ? d.parts.find(c.path[i]) : d.parts.end();
+                c.parts.push_back(part == d.parts.end() ? node::string(c.path[i]) : part->second);
+            }
+        each(std::move(d.changes));
+        d.changes.clear();
+    };
+    compare_files(d, keyed_dsects(old_file, d.parts), keyed_dsects(new_file, d.parts), flush);
+}
+
+std::vector<change> diff(const dsect_source &old_file, const dsect_source &new_file) {
+    std::vector<change> all;
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+        for (change &c : batch) {
+            c.content = nullptr; // it refers to records of this batch only
+            all.push_back(std::move(c));
         }
-    return d.changes;
+    });
+    return all;
 }
 
 namespace {
@@ -373,15 +486,27 @@ std::string change_line(const change &c, bool compat) {
     return s + (compat ? " (" + c.reason + ")" : "") + "\n";
 }
 
-node change_node(const change &c, bool compat) {
+// One change as an item of the document's list; what was removed or added
+// whole is written as it is read.
+void write_change(tree_writer &w, const change &c, bool compat) {
     node path = node::array();
     for (const node &part : c.parts)
         path.push(part);
-    node n = node::object().add("change", node::token(kind_name(c.what))).add("path", path);
-    n.add("old", c.before).add("new", c.after);
+    w.begin_object();
+    w.members(node::object().add("change", node::token(kind_name(c.what))).add("path", path));
+    if (c.content && c.what == change::kind::removed)
+        c.content(w, "old");
+    else
+        w.member("old", c.before);
+    if (c.content && c.what == change::kind::added)
+        c.content(w, "new");
+    else
+        w.member("new", c.after);
     if (compat)
-        n.add("breaking", node::real(c.breaking ? "true" : "false")).add("reason", node::string(c.reason));
-    return n;
+        w.members(node::object()
+                      .add("breaking", node::real(c.breaking ? "true" : "false"))
+                      .add("reason", node::string(c.reason)));
+    w.end();
 }
 } // namespace
 
@@ -398,22 +523,43 @@ void judge(std::vector<change> &changes) {
     }
 }
 
-void write_changes(text_sink &out, const std::vector<change> &changes, bool json, bool compat) {
+int report_changes(const dsect_source &old_file, const dsect_source &new_file, bool json, bool compat, text_sink &out) {
+    size_t count = 0;
+    bool breaks = false;
+    auto judged = [&](std::vector<change> &batch) {
+        if (compat)
+            judge(batch);
+        count += batch.size();
+        breaks = breaks || std::any_of(batch.begin(), batch.end(), [](const change &c) { return c.breaking; });
+    };
     if (!json) {
-        for (const change &c : changes)
-            out << change_line(c, compat);
-        return;
+        diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+            judged(batch);
+            for (const change &c : batch)
+                out << change_line(c, compat);
+        });
+        return (compat ? breaks : count > 0) ? 1 : 0;
     }
-    bool breaks = std::any_of(changes.begin(), changes.end(), [](const change &c) { return c.breaking; });
-    node list = node::array();
-    for (const change &c : changes)
-        list.push(change_node(c, compat));
-    node doc = node::object();
+    // The verdict comes before the changes in the document: a first pass
+    // finds it, a second writes the changes batch by batch, as to_json of the
+    // whole document would.
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) { judged(batch); });
+    tree_writer w(tree_writer::style::json, out);
+    w.begin_object();
     if (compat)
-        doc.add("compatible", node::real(breaks ? "false" : "true"));
+        w.members(node::object().add("compatible", node::real(breaks ? "false" : "true")));
     else
-        doc.add("equal", node::real(changes.empty() ? "true" : "false"));
-    out << to_json(doc.add("changes", list));
+        w.members(node::object().add("equal", node::real(count ? "false" : "true")));
+    w.begin_array("changes", count);
+    diff_each(old_file, new_file, [&](std::vector<change> &&batch) {
+        if (compat)
+            judge(batch);
+        for (const change &c : batch)
+            write_change(w, c, compat);
+    });
+    w.end();
+    w.end();
+    return (compat ? breaks : count > 0) ? 1 : 0;
 }
 
 } // namespace cdbdump

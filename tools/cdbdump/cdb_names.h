@@ -36,6 +36,8 @@ std::string var_type_name(uint32_t vt);
 std::string dsect_kind_name(uint32_t type);
 
 inline bool is_wide_type(uint32_t dt) { return dt == 4 || dt == 5 || dt == 7; }
+// Int32 to Float64: a value held as its 32- or 64-bit pattern.
+inline bool is_number_type(uint32_t dt) { return dt >= ZU_INT32 && dt <= ZU_FLOAT64; }
 // The high end of a numeric range that no statement gave, as the bits of the
 // type (2 to 7).
 inline uint64_t hundred_bits(uint32_t dt) {

@@ -1,9 +1,9 @@
 #include "cdb_read.h"
 
-#include <qecfg/cdb_reader.h>
-
 #include <algorithm>
 #include <vector>
+
+#include "cdb_names.h"
 
 namespace cdbdump {
 
@@ -17,16 +17,12 @@ value read_value(const cdb_value_t &v, bool big_endian) {
     if (cdb_value_is_none(&v))
         return out;
     const unsigned char *data = v.cls->db->data;
-    switch (v.type) {
-    case CDB_INT32:
-    case CDB_UINT32:
-    case CDB_INT64:
-    case CDB_UINT64:
-    case CDB_FLOAT32:
-    case CDB_FLOAT64:
+    if (is_number_type(v.type)) {
         out.kind = value_kind::number;
         cdb_value_bits(&v, &out.bits);
         return out;
+    }
+    switch (v.type) {
     case CDB_UNKNOWN:
     case CDB_NONE_TYPE:
     case CDB_SBS:
@@ -49,16 +45,11 @@ value read_value(const cdb_value_t &v, bool big_endian) {
         out.bytes.assign(p, p + n);
         return out;
     }
-    case CDB_RH: {
-        cdb_handle_t h;
-        cdb_value_handle(&v, &h);
-        out.kind = value_kind::handle; // the 20 bytes as stored
-        const uint32_t words[5] = {h.header, h.id[0], h.id[1], h.id[2], h.id[3]};
-        for (uint32_t w : words)
-            for (int i = 0; i < 4; i++)
-                out.bytes.push_back(uint8_t(w >> (big_endian ? 8 * (3 - i) : 8 * i)));
+    case CDB_RH:
+        out.kind = value_kind::handle;
+        out.bytes.resize(HANDLE_SIZE);
+        handle_bytes(v, big_endian, out.bytes.data());
         return out;
-    }
     default: {
         out.kind = v.type == CDB_SD ? value_kind::sd : value_kind::array;
         uint32_t n = 0;
@@ -266,19 +257,29 @@ class model_reader {
 
 } // namespace
 
-bool library_accepts(const uint8_t *data, size_t size) {
-    cdb_t db;
+void handle_bytes(const cdb_value_t &v, bool big_endian, uint8_t *out) {
+    cdb_handle_t h;
+    cdb_value_handle(&v, &h);
+    const uint32_t words[5] = {h.header, h.id[0], h.id[1], h.id[2], h.id[3]};
+    for (int w = 0; w < 5; w++)
+        for (int i = 0; i < 4; i++)
+            out[4 * w + i] = uint8_t(words[w] >> (big_endian ? 8 * (3 - i) : 8 * i));
+}
+
+bool open_checked(const uint8_t *data, size_t size, cdb_t &db) {
     if (cdb_open(&db, data, size) != CDB_OK)
         return false;
     std::vector<unsigned char> scratch(cdb_check_scratch_size(&db));
     return cdb_check(&db, scratch.data(), scratch.size(), nullptr) == CDB_OK;
 }
 
-bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+bool library_accepts(const uint8_t *data, size_t size) {
     cdb_t db;
-    if (!library_accepts(data, size))
-        return false;
-    cdb_open(&db, data, size);
+    return open_checked(data, size, db);
+}
+
+cdb_file read_head(const cdb_t &db) {
+    cdb_file head;
     cdb_header_t h;
     cdb_get_header(&db, &h);
     head.big_endian = db.big_endian != 0;
@@ -293,12 +294,22 @@ bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_
     cdb_dsect_t d;
     for (uint32_t i = 0; cdb_dsect_at(&db, i, &d) == CDB_OK; i++)
         head.anchors.push_back(anchor{d.type, d.offset, d.length, d.revision});
-    model_reader reader(db);
+    return head;
+}
+
+dsect read_dsect(const cdb_t &db, uint32_t i, const cdb_dsect_t &d) { return model_reader(db).read(i, d); }
+
+bool read_checked(const uint8_t *data, size_t size, cdb_file &head, const dsect_consumer &each) {
+    cdb_t db;
+    if (!open_checked(data, size, db))
+        return false;
+    head = read_head(db);
+    cdb_dsect_t d;
     for (uint32_t i = 0; cdb_dsect_at(&db, i, &d) == CDB_OK; i++) {
         if (each)
-            each(i, reader.read(i, d));
+            each(i, read_dsect(db, i, d));
         else
-            head.dsects.push_back(reader.read(i, d));
+            head.dsects.push_back(read_dsect(db, i, d));
     }
     return true;
 }

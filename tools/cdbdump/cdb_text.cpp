@@ -1,27 +1,47 @@
 #include "cdb_text.h"
 
+#include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <cstring>
 
 namespace cdbdump {
 
+namespace {
+const char hex_chars[] = "0123456789abcdef";
+}
+
+void append_hex(std::string &out, uint64_t v) {
+    char buf[16];
+    size_t n = 0;
+    do {
+        buf[sizeof buf - ++n] = hex_chars[v & 15];
+        v >>= 4;
+    } while (v);
+    out += "0x";
+    out.append(buf + sizeof buf - n, n);
+}
+
 std::string hex(uint64_t v) {
-    char buf[24];
-    std::snprintf(buf, sizeof buf, "0x%llx", static_cast<unsigned long long>(v));
-    return buf;
+    std::string s;
+    append_hex(s, v);
+    return s;
 }
 
 std::string hexdec(uint64_t v) { return hex(v) + " (" + std::to_string(v) + ")"; }
 
-std::string hex_digits(const uint8_t *p, size_t n) {
-    static const char digits[] = "0123456789abcdef";
-    std::string s;
-    s.reserve(2 * n);
+void append_hex_digits(std::string &out, const uint8_t *p, size_t n) {
+    size_t at = out.size();
+    out.resize(at + 2 * n);
     for (size_t i = 0; i < n; i++) {
-        s += digits[p[i] >> 4];
-        s += digits[p[i] & 15];
+        out[at + 2 * i] = hex_chars[p[i] >> 4];
+        out[at + 2 * i + 1] = hex_chars[p[i] & 15];
     }
+}
+
+std::string hex_digits(const uint8_t *p, size_t n) {
+    std::string s;
+    append_hex_digits(s, p, n);
     return s;
 }
 
@@ -45,8 +65,8 @@ size_t utf8_length(const unsigned char *p, size_t n) {
 
 // Escapes shared by both quoting styles; the rest differs in how a control
 // byte is spelled and in whether bytes from 0x80 up must form UTF-8.
-std::string quote_with(const std::string &s, const char *control_fmt, bool utf8_only) {
-    std::string out = "\"";
+void quote_with(std::string &out, std::string_view s, const char *control_fmt, bool utf8_only) {
+    out += '"';
     const auto *p = reinterpret_cast<const unsigned char *>(s.data());
     for (size_t i = 0; i < s.size(); i++) {
         unsigned char c = p[i];
@@ -73,13 +93,25 @@ std::string quote_with(const std::string &s, const char *control_fmt, bool utf8_
             }
         }
     }
-    return out + "\"";
+    out += '"';
 }
 } // namespace
 
-std::string c_quote(const std::string &s) { return quote_with(s, "\\x%02x", false); }
+void append_c_quoted(std::string &out, std::string_view s) { quote_with(out, s, "\\x%02x", false); }
 
-std::string json_quote(const std::string &s) { return quote_with(s, "\\u%04x", true); }
+void append_json_quoted(std::string &out, std::string_view s) { quote_with(out, s, "\\u%04x", true); }
+
+std::string c_quote(const std::string &s) {
+    std::string out;
+    append_c_quoted(out, s);
+    return out;
+}
+
+std::string json_quote(const std::string &s) {
+    std::string out;
+    append_json_quoted(out, s);
+    return out;
+}
 
 namespace {
 template <typename F> std::string special_float(F f) {
@@ -95,8 +127,8 @@ std::string float32_text(uint32_t bits) {
     if (!std::isfinite(f))
         return special_float(f);
     char buf[48];
-    std::snprintf(buf, sizeof buf, "%.9g", double(f));
-    return buf;
+    // As %.9g would write it.
+    return std::string(buf, std::to_chars(buf, buf + sizeof buf, double(f), std::chars_format::general, 9).ptr);
 }
 
 std::string float64_text(uint64_t bits) {
@@ -105,8 +137,8 @@ std::string float64_text(uint64_t bits) {
     if (!std::isfinite(d))
         return special_float(d);
     char buf[48];
-    std::snprintf(buf, sizeof buf, "%.17g", d);
-    return buf;
+    // As %.17g would write it.
+    return std::string(buf, std::to_chars(buf, buf + sizeof buf, d, std::chars_format::general, 17).ptr);
 }
 
 std::string number_text(uint32_t type, uint64_t bits) {

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace cdbdump {
@@ -17,6 +18,11 @@ std::string c_quote(const std::string &s);          // "a\tb", with C escapes
 // JSON_BYTE_ESCAPE_BASE + byte (U+F780 to U+F7FF), written as an escape.
 std::string json_quote(const std::string &s);
 constexpr unsigned JSON_BYTE_ESCAPE_BASE = 0xf700;
+// hex, hex_digits, c_quote and json_quote appended to out.
+void append_hex(std::string &out, uint64_t v);
+void append_hex_digits(std::string &out, const uint8_t *p, size_t n);
+void append_c_quoted(std::string &out, std::string_view s);
+void append_json_quoted(std::string &out, std::string_view s);
 // The float text that reads back to the same bits: %.9g / %.17g, inf, nan.
 std::string float32_text(uint32_t bits);
 std::string float64_text(uint64_t bits);

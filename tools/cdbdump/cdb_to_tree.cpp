@@ -3,6 +3,7 @@
 #include <type_traits>
 
 #include "cdb_names.h"
+#include "cdb_print.h"
 #include "cdb_text.h"
 #include "cdb_walk.h"
 
@@ -95,6 +96,8 @@ void attr_tail(const attr_common &a, const prop_table &props, node &n) {
         .add("max_sd_index", node::uinteger(a.max_sd_idx));
 }
 
+} // namespace
+
 node pattr_node(const pattr &p) {
     node n = attr_head(p);
     attr_tail(p, pattr_props, n);
@@ -133,12 +136,16 @@ node action_node(const action &x) {
         .add("sd_response", sd_node(x.sd_response));
 }
 
+namespace {
+
 template <typename T, typename F> node list_node(const std::vector<T> &items, F f) {
     node a = node::array();
     for (const T &i : items)
         a.push(f(i));
     return a;
 }
+
+} // namespace
 
 // Everything of a class but its record lists.
 node class_fields(const class_dsect &c) {
@@ -160,19 +167,13 @@ node class_fields(const class_dsect &c) {
         .add("reset_sd", sd_node(c.reset_sd));
 }
 
-// Calls each(key, records, render) for the record lists of a class, in document order.
-template <typename F> void class_lists(const class_dsect &c, F each) {
-    each("persistent_class_attributes", c.pattrs_class, pattr_node);
-    each("dynamic_class_attributes", c.dattrs_class, dattr_node);
-    each("persistent_resource_attributes", c.pattrs, pattr_node);
-    each("dynamic_resource_attributes", c.dattrs, dattr_node);
-    each("class_actions", c.actions_class, action_node);
-    each("resource_actions", c.actions, action_node);
-}
+namespace {
 
 node class_node(const class_dsect &c) {
     node n = class_fields(c);
-    class_lists(c, [&](const char *key, const auto &items, auto render) { n.add(key, list_node(items, render)); });
+    class_lists(c, c, [&](const char *key, const auto &items, const auto &, auto render) {
+        n.add(key, list_node(items, render));
+    });
     return n;
 }
 
@@ -211,12 +212,13 @@ node var_class_node(const var_class_dsect &v) {
         .add("variable_ids", ids);
 }
 
+} // namespace
+
 node dsect_head(const anchor &a) {
     return node::object()
         .add("dsect", node::token(dsect_kind_name(a.type)))
         .add("revision", node::uinteger(a.revision));
 }
-} // namespace
 
 node dsect_node(const dsect &d, const anchor &a) {
     node head = dsect_head(a);
@@ -239,11 +241,6 @@ node dsect_node(const dsect &d, const anchor &a) {
 }
 
 namespace {
-void add_members(tree_writer &w, const node &object) {
-    for (const auto &m : object.members())
-        w.member(m.first, m.second);
-}
-
 const char *const record_size_names[NUM_RECORD_SIZES] = {
     "class", "cmmap", "manager", "variable_class", "pattr", "dattr", "action", "error", "depend",
 };
@@ -300,29 +297,34 @@ node to_tree(const cdb_file &f) {
     return file_head(f).add("dsects", dsects);
 }
 
-namespace {
-void begin_file(tree_writer &w, const cdb_file &f) {
-    w.begin_object();
-    add_members(w, file_head(f));
-    w.begin_array("dsects", f.anchors.size());
-}
-
 // A class is written record by record, so that only one record's tree is held.
-void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
+void write_dsect_members(tree_writer &w, const dsect &d, const anchor &a, bool with_kind) {
     const auto *c = std::get_if<class_dsect>(&d);
-    if (!c) {
-        w.item(dsect_node(d, a));
+    node head = c ? dsect_head(a) : dsect_node(d, a);
+    if (!with_kind)
+        head.erase("dsect");
+    w.members(head);
+    if (!c)
         return;
-    }
-    w.begin_object();
-    add_members(w, dsect_head(a));
-    add_members(w, class_fields(*c));
-    class_lists(*c, [&](const char *key, const auto &items, auto render) {
+    w.members(class_fields(*c));
+    class_lists(*c, *c, [&](const char *key, const auto &items, const auto &, auto render) {
         w.begin_array(key, items.size());
         for (const auto &x : items)
             w.item(render(x));
         w.end();
     });
+}
+
+namespace {
+void begin_file(tree_writer &w, const cdb_file &f) {
+    w.begin_object();
+    w.members(file_head(f));
+    w.begin_array("dsects", f.anchors.size());
+}
+
+void write_dsect(tree_writer &w, const dsect &d, const anchor &a) {
+    w.begin_object();
+    write_dsect_members(w, d, a, true);
     w.end();
 }
 
@@ -333,6 +335,8 @@ void end_file(tree_writer &w) {
 } // namespace
 
 void write_file(const uint8_t *data, size_t size, const cdb_file &head, tree_writer::style style, text_sink &out) {
+    if (print_checked(data, size, style, out))
+        return;
     tree_writer w(style, out);
     begin_file(w, head);
     verify_each(data, size, [&](size_t i, dsect &&d) { write_dsect(w, d, head.anchors[i]); });

@@ -8,6 +8,7 @@
 #include <utility>
 #include <vector>
 
+#include "cdb_flat.h"
 #include "cdb_sink.h"
 
 namespace cdbdump {
@@ -54,6 +55,10 @@ class node {
     std::vector<node> items_;
 };
 
+// The node as a flat document (keys refer to the node's: it must outlive
+// the document).
+void to_flat(const node &n, flat_doc &out, std::string_view key = {});
+
 std::string to_json(const node &n);
 // An indented "key: value" rendering; short lists and records on one line.
 std::string to_text(const node &n);
@@ -64,17 +69,26 @@ std::string to_json_line(const node &n);
 // to_json or to_text of the whole tree would: an object given member by
 // member, where a member may be an array given item by item, whose items may
 // again be objects given member by member. Objects and array items given this
-// way must have more than three members, as records do (a whole node passed
+// way must have more than three members, as records do (a whole entry passed
 // to member or item may be anything).
 class tree_writer {
   public:
     enum class style { json, text };
     tree_writer(style s, text_sink &out) : style_(s), out_(out) {}
-    // The document itself, or an item of the open array.
+    // The document itself, or an item of the open array; or a member of the
+    // open object.
     void begin_object();
-    void member(const std::string &key, const node &value);
+    void begin_object(std::string_view key);
+    // The entry at i of d, under its key; or n under key.
+    void member(const flat_doc &d, size_t i);
+    void member(std::string_view key, const node &n);
+    // Each member of the object at i of d, or of the object n.
+    void members(const flat_doc &d, size_t i);
+    void members(const node &n);
     // A member holding `count` items, each then given by item or begin_object.
-    void begin_array(const std::string &key, size_t count);
+    void begin_array(std::string_view key, size_t count);
+    // The entry at i of d as an item of the open array.
+    void item(const flat_doc &d, size_t i);
     void item(const node &n);
     // Closes the innermost object or array; closing the document ends it.
     void end();
@@ -84,10 +98,13 @@ class tree_writer {
         bool array;
         size_t indent, done;
     };
-    void next_member(const std::string &key);
+    void next_member(std::string_view key);
+    void open_member(std::string_view key, bool array, bool empty);
+    void mark_item_start(size_t indent);
     style style_;
     text_sink &out_;
     std::vector<frame> open_;
+    std::string line_;          // the rendering of the current piece
     bool item_opening_ = false; // text: the next line starts an item ("- ")
 };
 

@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <cstring>
 #include <iterator>
+#include <memory>
 #include <new>
 #include <optional>
 #include <string>
@@ -13,6 +14,7 @@
 #include "cdb_diff.h"
 #include "cdb_header.h"
 #include "cdb_input.h"
+#include "cdb_print.h"
 #include "cdb_read.h"
 #include "cdb_sink.h"
 #include "cdb_source.h"
@@ -89,6 +91,11 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
         }
         if (m == mode::check && library_accepts(in.data(), in.size()))
             return 0;
+        // One full check; only a file the library refuses is walked.
+        if ((m == mode::text || m == mode::json) &&
+            print_checked(in.data(), in.size(), m == mode::json ? tree_writer::style::json : tree_writer::style::text,
+                          out))
+            return 0;
         cdb_file head = verify_each(in.data(), in.size(), [](size_t, dsect &&) {});
         if (m == mode::header) {
             write_c_header(in.data(), in.size(), name, out);
@@ -103,28 +110,21 @@ int inspect(mode m, const std::string &path, text_sink &out, FILE *err) {
     return 0;
 }
 
-// Both files verified whole; their trees are compared.
+// Both files verified whole; their dsects are compared pair by pair.
 int compare(const command &c, text_sink &out, FILE *err) {
-    cdb_file files[2];
+    input_file in[2];
+    std::unique_ptr<dsect_source> files[2];
     for (int i = 0; i < 2; i++) {
-        input_file in;
-        if (auto status = load(in, c.operands[size_t(i)], err))
+        if (auto status = load(in[i], c.operands[size_t(i)], err))
             return *status;
         try {
-            files[i] = verify(in.data(), in.size());
+            files[i] = open_verified(in[i].data(), in[i].size());
         } catch (const cdb_invalid &e) {
-            report_invalid(err, display_name(c.operands[size_t(i)]), e.offset, e.message, in);
+            report_invalid(err, display_name(c.operands[size_t(i)]), e.offset, e.message, in[i]);
             return 2;
         }
     }
-    std::vector<change> changes = diff(files[0], files[1]);
-    bool compat = c.m == mode::compat;
-    if (compat)
-        judge(changes);
-    write_changes(out, changes, c.json, compat);
-    if (!compat)
-        return changes.empty() ? 0 : 1;
-    return std::any_of(changes.begin(), changes.end(), [](const change &x) { return x.breaking; }) ? 1 : 0;
+    return report_changes(*files[0], *files[1], c.json, c.m == mode::compat, out);
 }
 
 // Parses the options; a status when the command ends here (help, version, usage error).
