@@ -28,8 +28,10 @@ TEST_F(Place, ArrayFilledWhileTheTableGrowsKeepsEveryElement) {
     uint32_t slot = c.add_to_tbl(st, "\0\0\0\0\0\0\0\0", 8);
     const int n = 300;
     std::vector<string> texts;
+    texts.reserve(n);
     for (int i = 0; i < n; i++) {
-        texts.push_back(string(30, char('A' + i % 26)) + char('0' + i % 10)); // 31 chars: 32-byte body
+        texts.emplace_back(31, char('A' + i % 26)); // 31 chars: 32-byte body
+        texts.back().back() = char('0' + i % 10);
         zu_value_t in{};
         in.ptr_char = texts.back().data();
         ASSERT_EQ(copy_this_type(c, value_slot::in(st, slot), &in, ZU_CHAR_PTR_ARRAY, TYPE_SAME, st, &a, n), 0);
