@@ -285,7 +285,7 @@ TEST(libcdb, cpp_layer_reads_and_throws) {
 TEST(libcdb, damaged_images_stay_in_bounds_and_never_pass_what_the_walker_refuses) {
     for (bool big : {false, true}) {
         const std::vector<uint8_t> good = rich_image(big);
-        for (size_t off = 0; off < good.size(); off++)
+        for (size_t off = 0; off < good.size(); off += cdbtest::SWEEP_STEP)
             for (uint8_t v : {uint8_t(0), uint8_t(0xff), uint8_t(good[off] ^ 0x10)}) {
                 std::vector<uint8_t> b = good;
                 b[off] = v;
